@@ -1,0 +1,3 @@
+#include "Qmx_CorrDb.h"
+
+Qmx_CorrDb::~Qmx_CorrDb() = default;
