@@ -30,10 +30,10 @@ bool StartsWithZstdMagic(std::FILE* file) {
     return got == 4 && head[0] == 0x28 && head[1] == 0xB5 && head[2] == 0x2F && head[3] == 0xFD;
 }
 
-Stream* OpenForReading(const StringBase<char>& path) {
+Stream* OpenForReading(const StringBase<char>& path, bool raw) {
     std::FILE* file = std::fopen(path.c_str(), "rb");
     if (!file) return nullptr;
-    if (StartsWithZstdMagic(file)) return new ZstdReadStream(file, path);
+    if (!raw && StartsWithZstdMagic(file)) return new ZstdReadStream(file, path);
     return new PlainStream(file, path, true, false);
 }
 
@@ -76,7 +76,7 @@ Stream* File::open(const StringBase<char>& path, int access, bool create) {
     const bool write = (access & kWrite) != 0;
     const bool compressed = (access & kCompressed) != 0;
     if (read && write) return compressed ? nullptr : OpenForBoth(path, create);
-    if (read) return OpenForReading(path);
+    if (read) return OpenForReading(path, (access & kRaw) != 0);
     if (write) return OpenForWriting(path, compressed);
     return nullptr;
 }
@@ -148,6 +148,14 @@ bool File::remove_r(const StringBase<char>& path) {
     std::string trimmed = path;
     while (trimmed.size() > 1 && trimmed.back() == '/') trimmed.pop_back();
     return RemoveTree(trimmed);
+}
+
+bool File::resize_f(const StringBase<char>& path, std::int64_t size) {
+    if (size < 0) return false;
+    const int fd = ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0666);
+    if (fd < 0) return false;
+    const bool ok = ::ftruncate(fd, static_cast<off_t>(size)) == 0;
+    return ::close(fd) == 0 && ok;
 }
 
 bool File::rename_f(const StringBase<char>& from, const StringBase<char>& to) {

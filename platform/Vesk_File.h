@@ -19,12 +19,14 @@ public:
     static constexpr int kWrite = 2;       // a new file, or the old one emptied
     static constexpr int kTruncate = 4;    // with kWrite: the same (writing always replaces)
     static constexpr int kCompressed = 8;  // writing: the compressed form
+    static constexpr int kRaw = 16;        // reading: the bytes as stored, never decompressed
 
     // Opens `path`. Reading (kRead, with or without kCompressed) recognises the compressed
     // form by its magic number, so a file opens in whichever form it was written. Writing
     // (kWrite, 6, 10, 14) makes a new or emptied file, compressed with kCompressed. Read and
     // write together (3) opens an existing file for both, or, with `create`, makes it; the
-    // compressed form cannot be read and written at once (11 and 15 give null). `create` has
+    // compressed form cannot be read and written at once (11 and 15 give null). kRaw with
+    // kRead reads the stored bytes of either form as they are. `create` has
     // no other effect. Returns null on any failure. The caller releases it with close.
     static Stream* open(const StringBase<char>& path, int access, bool create);
     // Completes and closes the stream and deletes it; false when completing it failed (the
@@ -53,6 +55,9 @@ public:
     static bool remove_f(const StringBase<char>& path);
     // Removes a directory and everything in it, without following symbolic links.
     static bool remove_r(const StringBase<char>& path);
+    // Sets the file's length (zero bytes appended when it grows), creating a missing file.
+    // False on failure.
+    static bool resize_f(const StringBase<char>& path, std::int64_t size);
     // Renames atomically, replacing `to`. False on failure.
     static bool rename_f(const StringBase<char>& from, const StringBase<char>& to);
     // Makes the entries of a directory durable (fsync of the directory).

@@ -15,6 +15,7 @@
 #include <map>
 #include <ostream>
 #include <string>
+#include <typeinfo>
 
 #include "QmxCorrExport.h"
 #include "VeskExport.h"
@@ -106,6 +107,9 @@ QMX_CORR_EXPORT void Println(std::ostream& out, unsigned indent, const char* for
     VESK_PRINTF(3, 4);
 // The indent of Println as text, in the shared dump buffer (valid until the next dump call).
 QMX_CORR_EXPORT const char* GetIndentString(unsigned indent);
+
+// The readable name of a class for dump head lines, e.g. "Qmx_CorrDb_Internal".
+QMX_CORR_EXPORT std::string GetDumpName(const std::type_info& type);
 
 // A debug record: where it was raised and a number; its text lives in the dump buffer.
 class QMX_CORR_EXPORT Exception {

@@ -1,6 +1,9 @@
 #include "Qmx_CorrDbg.h"
 
+#include <cxxabi.h>
+
 #include <cstdarg>
+#include <cstdlib>
 #include <cstring>
 #include <iostream>
 
@@ -148,6 +151,14 @@ void Println(std::ostream& out, unsigned indent, const char* format, ...) {
 const char* GetIndentString(unsigned indent) {
     FillIndent(indent);
     return g_dumpBuffer;
+}
+
+std::string GetDumpName(const std::type_info& type) {
+    int status = 0;
+    char* readable = abi::__cxa_demangle(type.name(), nullptr, nullptr, &status);
+    std::string name = status == 0 && readable ? readable : type.name();
+    std::free(readable);
+    return name;
 }
 
 const char* const Exception::s_dbg = g_dumpBuffer;
