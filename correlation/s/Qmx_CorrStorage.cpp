@@ -1,0 +1,111 @@
+#include "Qmx_CorrStorage.h"
+
+#include <algorithm>
+#include <functional>
+
+#include "Qmx_CorrException.h"
+#include "Qmx_CorrStream.h"
+
+namespace {
+
+constexpr const char* kSourceFile = "s/Qmx_CorrStorage";
+constexpr const char* kRevision = "1";
+
+template <class T>
+unsigned int OrdinalOf(const std::vector<T*>& table, void* p) {
+    const auto found =
+        std::lower_bound(table.begin() + 1, table.end(), static_cast<T*>(p), std::less<T*>());
+    return p ? static_cast<unsigned int>(found - table.begin()) : 0u;
+}
+
+}  // namespace
+
+Qmx_CorrStorage::Qmx_CorrStorage(const Vesk::StringBase<char>& name, Qmx_CorrStream* stream,
+                                 Qmx_CorrStorageData& data)
+    : m_name(name), m_stream(stream), m_data(data) {}
+
+Vesk::StringBase<char> Qmx_CorrStorage::ReadString() { return m_stream->ReadString(); }
+void Qmx_CorrStorage::WriteString(const Vesk::StringBase<char>& text) {
+    m_stream->WriteString(text);
+}
+bool Qmx_CorrStorage::ReadBool() { return m_stream->ReadBool(); }
+void Qmx_CorrStorage::WriteBool(bool value) { m_stream->WriteBool(value); }
+unsigned char Qmx_CorrStorage::ReadUINT8() { return m_stream->ReadUINT8(); }
+void Qmx_CorrStorage::WriteUINT8(unsigned char value) { m_stream->WriteUINT8(value); }
+unsigned int Qmx_CorrStorage::ReadUINT32() { return m_stream->ReadUINT32(); }
+void Qmx_CorrStorage::WriteUINT32(unsigned int value) { m_stream->WriteUINT32(value); }
+
+unsigned int Qmx_CorrStorage::ReadOrdinal(std::size_t tableSize) {
+    const unsigned int ordinal = m_stream->ReadUINT32();
+    if (ordinal >= tableSize) QMX_CORR_THROW(InvalidDatabaseFormat, m_name.c_str());
+    return ordinal;
+}
+
+Qmx_CorrManagedContainer* Qmx_CorrStorage::ReadManagedContainerPtr() {
+    return m_data.containers[ReadOrdinal(m_data.containers.size())];
+}
+
+Qmx_CorrManagedImplicitRelationship* Qmx_CorrStorage::ReadManagedImpRelPtr() {
+    return m_data.implicitRelationships[ReadOrdinal(m_data.implicitRelationships.size())];
+}
+
+void Qmx_CorrStorage::WriteContainerPtr(void* p) {
+    m_stream->WriteUINT32(OrdinalOf(m_data.containers, p));
+}
+
+void Qmx_CorrStorage::WriteImpRelPtr(void* p) {
+    m_stream->WriteUINT32(OrdinalOf(m_data.implicitRelationships, p));
+}
+
+Qmx_CorrManagedItem* Qmx_CorrStorage::ReadManagedItemPtr() {
+    const unsigned int handle = ReadHandle();
+    if (!m_data.itemSwizzler) {
+        if (handle != 0) QMX_CORR_THROW(InvalidDatabaseFormat, m_name.c_str());
+        return nullptr;
+    }
+    return m_data.itemSwizzler->GetPtr(handle);
+}
+
+void Qmx_CorrStorage::WriteItemPtr(void* p) {
+    const auto item = static_cast<Qmx_CorrManagedItem*>(p);
+    WriteHandle(m_data.itemSwizzler ? m_data.itemSwizzler->GetHandle(item) : 0u);
+}
+
+Qmx_CorrManagedExplicitRelationship* Qmx_CorrStorage::ReadManagedExpRelPtr() {
+    const unsigned int handle = ReadHandle();
+    if (!m_data.expRelSwizzler) {
+        if (handle != 0) QMX_CORR_THROW(InvalidDatabaseFormat, m_name.c_str());
+        return nullptr;
+    }
+    return m_data.expRelSwizzler->GetPtr(handle);
+}
+
+void Qmx_CorrStorage::WriteExpRelPtr(void* p) {
+    const auto relationship = static_cast<Qmx_CorrManagedExplicitRelationship*>(p);
+    WriteHandle(m_data.expRelSwizzler ? m_data.expRelSwizzler->GetHandle(relationship) : 0u);
+}
+
+unsigned int Qmx_CorrStorage::ReadHandle() {
+    unsigned char bytes[4];
+    m_stream->read(reinterpret_cast<char*>(bytes), 4);
+    return static_cast<unsigned int>(bytes[0]) | static_cast<unsigned int>(bytes[1]) << 8 |
+           static_cast<unsigned int>(bytes[2]) << 16 | static_cast<unsigned int>(bytes[3]) << 24;
+}
+
+void Qmx_CorrStorage::WriteHandle(unsigned int handle) {
+    const char bytes[4] = {
+        static_cast<char>(handle & 0xFF), static_cast<char>((handle >> 8) & 0xFF),
+        static_cast<char>((handle >> 16) & 0xFF), static_cast<char>((handle >> 24) & 0xFF)};
+    m_stream->write(bytes, 4);
+}
+
+std::int64_t Qmx_CorrStorage::BytesLeft() const { return m_stream->BytesLeft(); }
+
+void Qmx_CorrStorage::CheckCount(std::uint64_t count, std::uint64_t bytesEach) const {
+    const std::int64_t left = BytesLeft();
+    if (left < 0) return;
+    // Divide rather than multiply: an absurd count must not overflow into a small product.
+    if (bytesEach != 0 && count > static_cast<std::uint64_t>(left) / bytesEach) {
+        QMX_CORR_THROW(InvalidDatabaseFormat, m_name.c_str());
+    }
+}

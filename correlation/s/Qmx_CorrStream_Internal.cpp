@@ -1,0 +1,147 @@
+#include "Qmx_CorrStream_Internal.h"
+
+#include <algorithm>
+#include <fstream>
+#include <iostream>
+
+#include "Qmx_CorrException.h"
+
+namespace {
+
+constexpr const char* kSourceFile = "s/Qmx_CorrStream_Internal";
+constexpr const char* kRevision = "1";
+// Long strings are read in pieces, so that a damaged length costs no more memory than the
+// bytes that really follow.
+constexpr std::size_t kStringPiece = 64 * 1024;
+
+}  // namespace
+
+Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(std::basic_iostream<char>* stream,
+                                                 const Vesk::StringBase<char>& errorName)
+    : m_stream(stream), m_owned(false), m_errorName(errorName.empty() ? "unknown" : errorName) {
+    if (!m_stream || m_stream->bad()) QMX_CORR_THROW(CannotReadDatabase, "unknown");
+}
+
+Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(const Vesk::StringBase<char>& path, int openMode,
+                                                 const Vesk::StringBase<char>& errorName)
+    : m_stream(nullptr), m_owned(true), m_errorName(errorName.empty() ? path : errorName) {
+    auto* file = new std::fstream(path, static_cast<std::ios::openmode>(openMode));
+    if (!file->is_open() || file->fail()) {
+        delete file;
+        QMX_CORR_THROW(CannotReadDatabase, path.c_str());
+    }
+    m_stream = file;
+}
+
+Qmx_CorrStream_Internal::~Qmx_CorrStream_Internal() {
+    if (m_owned) delete m_stream;
+}
+
+void Qmx_CorrStream_Internal::ThrowShortRead() const {
+    m_stream->clear();
+    QMX_CORR_THROW(InvalidDatabaseFormat, m_errorName.c_str());
+}
+
+void Qmx_CorrStream_Internal::ThrowFailedWrite() const {
+    m_stream->clear();
+    QMX_CORR_THROW(CannotWriteDatabase, m_errorName.c_str());
+}
+
+unsigned int Qmx_CorrStream_Internal::GetPos() const {
+    std::streamoff pos = m_stream->tellp();
+    if (pos < 0) pos = m_stream->tellg();
+    m_stream->clear();
+    return static_cast<unsigned int>(pos < 0 ? 0 : pos);
+}
+
+void Qmx_CorrStream_Internal::SeekEnd() {
+    m_stream->clear();
+    m_stream->seekp(0, std::ios::end);
+    m_stream->seekg(0, std::ios::end);
+    m_stream->clear();
+}
+
+void Qmx_CorrStream_Internal::SeekPos(unsigned int pos) {
+    m_stream->clear();
+    m_stream->seekp(pos, std::ios::beg);
+    m_stream->seekg(pos, std::ios::beg);
+    m_stream->clear();
+}
+
+Vesk::StringBase<char> Qmx_CorrStream_Internal::ReadString() {
+    const unsigned int length = ReadUINT32();
+    const std::int64_t left = BytesLeft();
+    if (left >= 0 && static_cast<std::int64_t>(length) > left) ThrowShortRead();
+    std::string text;
+    while (text.size() < length) {
+        const std::size_t piece = std::min<std::size_t>(kStringPiece, length - text.size());
+        const std::size_t old = text.size();
+        text.resize(old + piece);
+        read(&text[old], static_cast<unsigned int>(piece));
+    }
+    return text;
+}
+
+void Qmx_CorrStream_Internal::WriteString(const Vesk::StringBase<char>& text) {
+    WriteUINT32(static_cast<unsigned int>(text.size()));
+    write(text.data(), static_cast<unsigned int>(text.size()));
+}
+
+bool Qmx_CorrStream_Internal::ReadBool() { return ReadUINT8() != 0; }
+
+void Qmx_CorrStream_Internal::WriteBool(bool value) { WriteUINT8(value ? 1 : 0); }
+
+unsigned char Qmx_CorrStream_Internal::ReadUINT8() {
+    char byte;
+    read(&byte, 1);
+    return static_cast<unsigned char>(byte);
+}
+
+void Qmx_CorrStream_Internal::WriteUINT8(unsigned char value) {
+    const char byte = static_cast<char>(value);
+    write(&byte, 1);
+}
+
+unsigned int Qmx_CorrStream_Internal::ReadUINT32() {
+    unsigned char bytes[4];
+    read(reinterpret_cast<char*>(bytes), 4);
+    return static_cast<unsigned int>(bytes[0]) | static_cast<unsigned int>(bytes[1]) << 8 |
+           static_cast<unsigned int>(bytes[2]) << 16 | static_cast<unsigned int>(bytes[3]) << 24;
+}
+
+void Qmx_CorrStream_Internal::WriteUINT32(unsigned int value) {
+    const char bytes[4] = {static_cast<char>(value & 0xFF), static_cast<char>((value >> 8) & 0xFF),
+                           static_cast<char>((value >> 16) & 0xFF),
+                           static_cast<char>((value >> 24) & 0xFF)};
+    write(bytes, 4);
+}
+
+void Qmx_CorrStream_Internal::read(char* buffer, unsigned int count) {
+    if (count == 0) return;
+    m_stream->read(buffer, count);
+    if (static_cast<unsigned int>(m_stream->gcount()) != count) ThrowShortRead();
+}
+
+void Qmx_CorrStream_Internal::write(const char* buffer, unsigned int count) {
+    if (count == 0) return;
+    m_stream->write(buffer, count);
+    if (!*m_stream) ThrowFailedWrite();
+}
+
+void Qmx_CorrStream_Internal::Flush() {
+    m_stream->flush();
+    if (!*m_stream) ThrowFailedWrite();
+}
+
+std::int64_t Qmx_CorrStream_Internal::BytesLeft() const {
+    const std::streamoff pos = m_stream->tellg();
+    if (pos < 0) {
+        m_stream->clear();
+        return -1;
+    }
+    m_stream->seekg(0, std::ios::end);
+    const std::streamoff end = m_stream->tellg();
+    m_stream->seekg(pos, std::ios::beg);
+    m_stream->clear();
+    return end < pos ? 0 : static_cast<std::int64_t>(end - pos);
+}
