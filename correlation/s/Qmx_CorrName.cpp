@@ -1,0 +1,3 @@
+#include "Qmx_CorrName.h"
+
+Qmx_CorrName::~Qmx_CorrName() = default;

@@ -1,0 +1,3 @@
+#include "Qmx_CorrNameRepository.h"
+
+Qmx_CorrNameRepository::~Qmx_CorrNameRepository() = default;
