@@ -16,6 +16,7 @@ class Qmx_CorrStream;
 class QMX_CORR_EXPORT Qmx_CorrStorage {
 public:
     // `name` is the database's, carried by the exceptions of every reader.
+    // REQUIRES: `stream` is not null and outlives the storage.
     Qmx_CorrStorage(const Vesk::StringBase<char>& name, Qmx_CorrStream* stream,
                     Qmx_CorrStorageData& data);
 
@@ -35,12 +36,14 @@ public:
     // Ordinal readers: an ordinal beyond its table is InvalidDatabaseFormat.
     Qmx_CorrManagedContainer* ReadManagedContainerPtr();
     Qmx_CorrManagedImplicitRelationship* ReadManagedImpRelPtr();
-    // REQUIRES: the table is sorted and holds `p` (null writes 0).
+    // REQUIRES: the table is sorted by std::less. Null writes 0; an object that is not in
+    // the table throws InvalidRequest and writes nothing.
     void WriteContainerPtr(void* p);
     void WriteImpRelPtr(void* p);
 
-    // Handle readers ask the pool manager's swizzler; a non-zero handle without a swizzler is
-    // InvalidDatabaseFormat.
+    // Handle readers ask the pool manager's swizzler (for handle 0 too); without a swizzler
+    // handle 0 reads as null and any other is InvalidDatabaseFormat. Writers ask the
+    // swizzler; without one, null writes 0 and an object throws InvalidRequest.
     Qmx_CorrManagedItem* ReadManagedItemPtr();
     void WriteItemPtr(void* p);
     Qmx_CorrManagedExplicitRelationship* ReadManagedExpRelPtr();

@@ -4,6 +4,8 @@
 // stream refuses throws CannotWriteDatabase with it. One thread at a time.
 #ifndef QMX_CORRSTREAM_INTERNAL_H
 #define QMX_CORRSTREAM_INTERNAL_H
+#include <cstdint>
+#include <ios>
 #include <iosfwd>
 
 #include "Qmx_CorrStream.h"
@@ -24,7 +26,9 @@ public:
     Qmx_CorrStream_Internal& operator=(const Qmx_CorrStream_Internal&) = delete;
 
     unsigned int GetPos() const override;
-    // Positioning moves reading and writing alike (a file has one position).
+    // Positioning moves reading and writing alike (a file has one position). A position the
+    // stream cannot take (beyond the end of a string stream) throws InvalidDatabaseFormat
+    // and leaves the position as it was.
     void SeekEnd() override;
     void SeekPos(unsigned int pos) override;
     Vesk::StringBase<char> ReadString() override;
@@ -38,15 +42,22 @@ public:
     void read(char* buffer, unsigned int count) override;
     void write(const char* buffer, unsigned int count) override;
     void Flush() override;
+    // From the end of the data and the read position; -1 when the stream cannot tell.
     std::int64_t BytesLeft() const override;
 
 private:
     [[noreturn]] void ThrowShortRead() const;
     [[noreturn]] void ThrowFailedWrite() const;
+    // Moves both sides; false (position unchanged) when neither side could move.
+    bool Reposition(std::streamoff offset, std::ios_base::seekdir from);
+    // The end of the data, or -1. Cached for a file of our own, whose end only our writes
+    // move; a caller's stream may be written behind our back and is asked every time.
+    std::int64_t DataEnd() const;
 
     std::basic_iostream<char>* m_stream;  // owned when m_owned
     bool m_owned;
     Vesk::StringBase<char> m_errorName;
+    mutable std::int64_t m_knownEnd;  // -1: not known; used only when m_owned
 };
 
 #endif

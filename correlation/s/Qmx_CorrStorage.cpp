@@ -11,11 +11,26 @@ namespace {
 constexpr const char* kSourceFile = "s/Qmx_CorrStorage";
 constexpr const char* kRevision = "1";
 
+// The position of `p` in a table sorted by std::less after its null entry 0; 0 for null.
+// An object missing from the table has no ordinal: the lower bound would be a neighbour's,
+// and the record would silently refer to another object.
 template <class T>
-unsigned int OrdinalOf(const std::vector<T*>& table, void* p) {
-    const auto found =
-        std::lower_bound(table.begin() + 1, table.end(), static_cast<T*>(p), std::less<T*>());
-    return p ? static_cast<unsigned int>(found - table.begin()) : 0u;
+unsigned int OrdinalOf(const std::vector<T*>& table, void* p, const char* what) {
+    if (!p) return 0;
+    T* const object = static_cast<T*>(p);
+    const auto found = std::lower_bound(table.begin() + 1, table.end(), object, std::less<T*>());
+    if (found == table.end() || *found != object) QMX_CORR_THROW(InvalidRequest, what);
+    return static_cast<unsigned int>(found - table.begin());
+}
+
+// Without a swizzler only the null reference can be written: a real object would become
+// the null handle and its link would be lost.
+template <class T>
+unsigned int HandleOf(Qmx_CorrPtrSwizzlerT<T, unsigned int>* swizzler, void* p, const char* what) {
+    T* const object = static_cast<T*>(p);
+    if (swizzler) return swizzler->GetHandle(object);
+    if (object) QMX_CORR_THROW(InvalidRequest, what);
+    return 0;
 }
 
 }  // namespace
@@ -50,11 +65,13 @@ Qmx_CorrManagedImplicitRelationship* Qmx_CorrStorage::ReadManagedImpRelPtr() {
 }
 
 void Qmx_CorrStorage::WriteContainerPtr(void* p) {
-    m_stream->WriteUINT32(OrdinalOf(m_data.containers, p));
+    m_stream->WriteUINT32(
+        OrdinalOf(m_data.containers, p, "WriteContainerPtr: the container is not in the table"));
 }
 
 void Qmx_CorrStorage::WriteImpRelPtr(void* p) {
-    m_stream->WriteUINT32(OrdinalOf(m_data.implicitRelationships, p));
+    m_stream->WriteUINT32(OrdinalOf(m_data.implicitRelationships, p,
+                                    "WriteImpRelPtr: the relationship is not in the table"));
 }
 
 Qmx_CorrManagedItem* Qmx_CorrStorage::ReadManagedItemPtr() {
@@ -67,8 +84,7 @@ Qmx_CorrManagedItem* Qmx_CorrStorage::ReadManagedItemPtr() {
 }
 
 void Qmx_CorrStorage::WriteItemPtr(void* p) {
-    const auto item = static_cast<Qmx_CorrManagedItem*>(p);
-    WriteHandle(m_data.itemSwizzler ? m_data.itemSwizzler->GetHandle(item) : 0u);
+    WriteHandle(HandleOf(m_data.itemSwizzler, p, "WriteItemPtr: no item swizzler"));
 }
 
 Qmx_CorrManagedExplicitRelationship* Qmx_CorrStorage::ReadManagedExpRelPtr() {
@@ -81,8 +97,8 @@ Qmx_CorrManagedExplicitRelationship* Qmx_CorrStorage::ReadManagedExpRelPtr() {
 }
 
 void Qmx_CorrStorage::WriteExpRelPtr(void* p) {
-    const auto relationship = static_cast<Qmx_CorrManagedExplicitRelationship*>(p);
-    WriteHandle(m_data.expRelSwizzler ? m_data.expRelSwizzler->GetHandle(relationship) : 0u);
+    WriteHandle(
+        HandleOf(m_data.expRelSwizzler, p, "WriteExpRelPtr: no explicit-relationship swizzler"));
 }
 
 unsigned int Qmx_CorrStorage::ReadHandle() {

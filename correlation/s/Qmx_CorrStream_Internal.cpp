@@ -18,13 +18,19 @@ constexpr std::size_t kStringPiece = 64 * 1024;
 
 Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(std::basic_iostream<char>* stream,
                                                  const Vesk::StringBase<char>& errorName)
-    : m_stream(stream), m_owned(false), m_errorName(errorName.empty() ? "unknown" : errorName) {
+    : m_stream(stream),
+      m_owned(false),
+      m_errorName(errorName.empty() ? "unknown" : errorName),
+      m_knownEnd(-1) {
     if (!m_stream || m_stream->bad()) QMX_CORR_THROW(CannotReadDatabase, "unknown");
 }
 
 Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(const Vesk::StringBase<char>& path, int openMode,
                                                  const Vesk::StringBase<char>& errorName)
-    : m_stream(nullptr), m_owned(true), m_errorName(errorName.empty() ? path : errorName) {
+    : m_stream(nullptr),
+      m_owned(true),
+      m_errorName(errorName.empty() ? path : errorName),
+      m_knownEnd(-1) {
     auto* file = new std::fstream(path, static_cast<std::ios::openmode>(openMode));
     if (!file->is_open() || file->fail()) {
         delete file;
@@ -54,18 +60,29 @@ unsigned int Qmx_CorrStream_Internal::GetPos() const {
     return static_cast<unsigned int>(pos < 0 ? 0 : pos);
 }
 
+bool Qmx_CorrStream_Internal::Reposition(std::streamoff offset, std::ios_base::seekdir from) {
+    // A stream open for one direction only cannot move the other side; a position that
+    // neither side can take is refused, since reading on from the old one would misread.
+    const std::streampos oldPut = m_stream->tellp();
+    const std::streampos oldGet = m_stream->tellg();
+    m_stream->clear();
+    const bool putMoved = !m_stream->seekp(offset, from).fail();
+    m_stream->clear();
+    const bool getMoved = !m_stream->seekg(offset, from).fail();
+    m_stream->clear();
+    if (putMoved || getMoved) return true;
+    if (oldPut >= 0) m_stream->seekp(oldPut);
+    if (oldGet >= 0) m_stream->seekg(oldGet);
+    m_stream->clear();
+    return false;
+}
+
 void Qmx_CorrStream_Internal::SeekEnd() {
-    m_stream->clear();
-    m_stream->seekp(0, std::ios::end);
-    m_stream->seekg(0, std::ios::end);
-    m_stream->clear();
+    if (!Reposition(0, std::ios::end)) ThrowShortRead();
 }
 
 void Qmx_CorrStream_Internal::SeekPos(unsigned int pos) {
-    m_stream->clear();
-    m_stream->seekp(pos, std::ios::beg);
-    m_stream->seekg(pos, std::ios::beg);
-    m_stream->clear();
+    if (!Reposition(static_cast<std::streamoff>(pos), std::ios::beg)) ThrowShortRead();
 }
 
 Vesk::StringBase<char> Qmx_CorrStream_Internal::ReadString() {
@@ -83,6 +100,8 @@ Vesk::StringBase<char> Qmx_CorrStream_Internal::ReadString() {
 }
 
 void Qmx_CorrStream_Internal::WriteString(const Vesk::StringBase<char>& text) {
+    // No length of 4 bytes can describe a longer string, and a cut one would misread.
+    if (text.size() > 0xFFFFFFFFu) ThrowFailedWrite();
     WriteUINT32(static_cast<unsigned int>(text.size()));
     write(text.data(), static_cast<unsigned int>(text.size()));
 }
@@ -124,6 +143,7 @@ void Qmx_CorrStream_Internal::read(char* buffer, unsigned int count) {
 
 void Qmx_CorrStream_Internal::write(const char* buffer, unsigned int count) {
     if (count == 0) return;
+    m_knownEnd = -1;
     m_stream->write(buffer, count);
     if (!*m_stream) ThrowFailedWrite();
 }
@@ -139,9 +159,21 @@ std::int64_t Qmx_CorrStream_Internal::BytesLeft() const {
         m_stream->clear();
         return -1;
     }
+    const std::int64_t end = DataEnd();
+    if (end < 0) return -1;
+    return end < pos ? 0 : end - static_cast<std::int64_t>(pos);
+}
+
+std::int64_t Qmx_CorrStream_Internal::DataEnd() const {
+    // Finding the end of a file drops its read buffer; readers ask before every string, so
+    // a file of our own is measured once and again only after a write.
+    if (m_owned && m_knownEnd >= 0) return m_knownEnd;
+    const std::streampos pos = m_stream->tellg();
     m_stream->seekg(0, std::ios::end);
     const std::streamoff end = m_stream->tellg();
-    m_stream->seekg(pos, std::ios::beg);
+    m_stream->seekg(pos);
     m_stream->clear();
-    return end < pos ? 0 : static_cast<std::int64_t>(end - pos);
+    if (end < 0) return -1;
+    if (m_owned) m_knownEnd = static_cast<std::int64_t>(end);
+    return static_cast<std::int64_t>(end);
 }

@@ -32,9 +32,12 @@ public:
     }
     unsigned int GetHandle(T* object) override { return object ? m_handles.at(object) : 0; }
     T* GetPtr(unsigned int handle) override {
+        ++m_lookups;
         const auto found = m_objects.find(handle);
         return found == m_objects.end() ? nullptr : found->second;
     }
+
+    int m_lookups = 0;
 
 private:
     std::map<T*, unsigned int> m_handles;
@@ -43,7 +46,7 @@ private:
 
 class CorrStorageTest : public ::testing::Test {
 protected:
-    CorrStorageTest() : m_stream(&m_bytes), m_storage("db.cpd", &m_stream, m_data) {
+    CorrStorageTest() : m_stream(&m_bytes, "db.cpd"), m_storage("db.cpd", &m_stream, m_data) {
         for (std::uintptr_t n : {9, 3, 5})
             m_data.containers.push_back(Fake<Qmx_CorrManagedContainer>(n));
         std::sort(m_data.containers.begin() + 1, m_data.containers.end(),
@@ -121,6 +124,66 @@ TEST_F(CorrStorageTest, CheckCountComparesWithTheBytesLeft) {
     EXPECT_THROW(m_storage.CheckCount(0x4000000000000001ull, 4),
                  Qmx_CorrException::InvalidDatabaseFormat);
     EXPECT_EQ(m_storage.GetName(), "db.cpd");
+}
+
+TEST_F(CorrStorageTest, OrdinalsWrittenInTableOrderFindTheRestoredCopies) {
+    for (std::size_t i = 1; i < m_data.containers.size(); ++i)
+        m_storage.WriteContainerPtr(m_data.containers[i]);
+    m_storage.WriteContainerPtr(nullptr);
+    // On reopening, the table holds the restored objects in the order their records came.
+    m_data.containers = {nullptr, Fake<Qmx_CorrManagedContainer>(100),
+                         Fake<Qmx_CorrManagedContainer>(101), Fake<Qmx_CorrManagedContainer>(102)};
+    Rewind();
+    for (std::size_t i = 1; i < m_data.containers.size(); ++i)
+        EXPECT_EQ(m_storage.ReadManagedContainerPtr(), m_data.containers[i]) << "ordinal " << i;
+    EXPECT_EQ(m_storage.ReadManagedContainerPtr(), nullptr);
+}
+
+TEST_F(CorrStorageTest, ObjectsWithoutANumberAreRefusedAndNothingIsWritten) {
+    const auto refused = [](const std::string& what) {
+        return ThrowsMessage<Qmx_CorrException::InvalidRequest>(
+            StrEq("Qmx_CorrException::InvalidRequest.  '" + what + "'\n"));
+    };
+    // Between two table entries and beyond the last: the lower bound would be a neighbour's.
+    EXPECT_THAT([&] { m_storage.WriteContainerPtr(Fake<Qmx_CorrManagedContainer>(4)); },
+                refused("WriteContainerPtr: the container is not in the table"));
+    EXPECT_THROW(m_storage.WriteContainerPtr(Fake<Qmx_CorrManagedContainer>(10)),
+                 Qmx_CorrException::InvalidRequest);
+    EXPECT_THAT([&] { m_storage.WriteImpRelPtr(Fake<Qmx_CorrManagedImplicitRelationship>(8)); },
+                refused("WriteImpRelPtr: the relationship is not in the table"));
+    m_data.itemSwizzler = nullptr;
+    m_data.expRelSwizzler = nullptr;
+    EXPECT_THAT([&] { m_storage.WriteItemPtr(Fake<Qmx_CorrManagedItem>(1)); },
+                refused("WriteItemPtr: no item swizzler"));
+    EXPECT_THAT([&] { m_storage.WriteExpRelPtr(Fake<Qmx_CorrManagedExplicitRelationship>(2)); },
+                refused("WriteExpRelPtr: no explicit-relationship swizzler"));
+    EXPECT_EQ(m_bytes.str(), "");
+    m_storage.WriteItemPtr(nullptr);
+    m_storage.WriteExpRelPtr(nullptr);
+    EXPECT_EQ(m_bytes.str(), std::string(8, '\0'));
+}
+
+TEST_F(CorrStorageTest, NullHandleIsTheSwizzlersToAnswerWhenThereIsOne) {
+    m_items.Add(Fake<Qmx_CorrManagedItem>(40), 0);  // a swizzler may map 0 as it likes
+    m_storage.WriteHandle(0);
+    m_storage.WriteHandle(0);
+    Rewind();
+    EXPECT_EQ(m_storage.ReadManagedItemPtr(), Fake<Qmx_CorrManagedItem>(40));
+    EXPECT_EQ(m_items.m_lookups, 1);
+    m_data.itemSwizzler = nullptr;
+    EXPECT_EQ(m_storage.ReadManagedItemPtr(), nullptr);
+    EXPECT_EQ(m_items.m_lookups, 1);
+}
+
+TEST_F(CorrStorageTest, CutHandlesAndOrdinalsAreDamage) {
+    const std::string damaged =
+        "Qmx_CorrException::InvalidDatabaseFormat. Unable to read 'db.cpd'.\n";
+    m_bytes.write("\x01\x02\x03", 3);
+    EXPECT_THAT([&] { m_storage.ReadManagedExpRelPtr(); },
+                ThrowsMessage<Qmx_CorrException::InvalidDatabaseFormat>(StrEq(damaged)));
+    Rewind();
+    EXPECT_THROW(m_storage.ReadManagedContainerPtr(), Qmx_CorrException::InvalidDatabaseFormat);
+    EXPECT_EQ(m_relationships.m_lookups, 0);
 }
 
 }  // namespace
