@@ -1,0 +1,3 @@
+#include "Qmx_CorrItemRelOverflowMgrI.h"
+
+Qmx_CorrItemRelOverflowMgrI::~Qmx_CorrItemRelOverflowMgrI() = default;

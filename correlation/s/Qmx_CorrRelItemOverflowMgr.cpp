@@ -1,0 +1,6 @@
+#include "Qmx_CorrRelItemOverflowMgr.h"
+
+Qmx_CorrRelItemOverflowMgr::Qmx_CorrRelItemOverflowMgr(Swizzler* swizzler)
+    : Qmx_CorrOverflowMgrT(swizzler) {}
+
+Qmx_CorrRelItemOverflowMgr::~Qmx_CorrRelItemOverflowMgr() = default;

@@ -1,0 +1,3 @@
+#include "Qmx_CorrRelItemOverflowMgrI.h"
+
+Qmx_CorrRelItemOverflowMgrI::~Qmx_CorrRelItemOverflowMgrI() = default;
