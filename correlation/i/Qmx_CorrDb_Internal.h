@@ -17,6 +17,8 @@
 // An empty file is a new database without streams.
 #ifndef QMX_CORRDB_INTERNAL_H
 #define QMX_CORRDB_INTERNAL_H
+#include <map>
+#include <set>
 #include <vector>
 
 #include "Qmx_CorrDb.h"
@@ -51,7 +53,9 @@ public:
     void CloseStream(Qmx_CorrStream* stream) override;
     void SetStreamSize(const Vesk::StringBase<char>& name, int size) override;
     // Packs every file of the temporary directory into the CPD file (compressed when
-    // OBR_QMX_USE_COMPRESSION is set). Open streams are flushed and stay open. Throws
+    // OBR_QMX_USE_COMPRESSION is set). Open streams are flushed and stay open. A portable
+    // stream whose closing failed is incomplete: Commit refuses it with CannotWriteDatabase
+    // until it has been written and closed again. Throws
     // CannotWriteDatabase or CannotReadDatabase on failure, and Vesk::Exception when a stream
     // is larger than 4 GiB - 1 bytes; the last committed file is then untouched and no
     // temporary file is left.
@@ -75,6 +79,10 @@ private:
     Vesk::StringBase<char> m_name;               // path of the CPD file
     Vesk::StringBase<char> m_tempDir;            // ends in "/"
     std::vector<Qmx_CorrStream*> m_openStreams;  // owned
+    // Portable streams open for writing, by name: their bytes reach the file only when they
+    // are closed, and a close that fails must stop the next commit.
+    std::map<Qmx_CorrStream*, Vesk::StringBase<char>> m_portableWriters;
+    std::set<Vesk::StringBase<char>> m_incompleteStreams;  // closes that failed
     bool m_ownsTempDir;
     bool m_isNew;
 };

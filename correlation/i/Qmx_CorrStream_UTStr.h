@@ -37,6 +37,10 @@ public:
     void Flush() override;
     std::int64_t BytesLeft() const override;
 
+    // Completes and closes the file (a compressed stream's data is written out only now).
+    // False when that failed: the file is then incomplete. Later operations are not allowed.
+    bool Close();
+
 private:
     Vesk::Stream* m_stream;  // owned
     Vesk::StringBase<char> m_errorName;

@@ -105,6 +105,7 @@ Qmx_CorrDb_Internal::~Qmx_CorrDb_Internal() { Release(); }
 void Qmx_CorrDb_Internal::Release() {
     for (Qmx_CorrStream* stream : m_openStreams) delete stream;
     m_openStreams.clear();
+    m_portableWriters.clear();
     if (m_ownsTempDir && !m_tempDir.empty()) {
         Vesk::StringBase<char> dir = m_tempDir;
         dir.Truncate(dir.size() - 1);
@@ -242,6 +243,7 @@ Qmx_CorrStream* Qmx_CorrDb_Internal::OpenStream(const Vesk::StringBase<char>& na
             if (read && write) return nullptr;
             const int access = read ? 9 : (write && truncate ? 10 : 14);
             stream = new Qmx_CorrStream_UTStr(path, access, truncate, m_name);
+            if (write) m_portableWriters[stream] = name;
         } else {
             std::ios::openmode openMode = std::ios::binary;
             if (read) openMode |= std::ios::in;
@@ -260,6 +262,16 @@ void Qmx_CorrDb_Internal::CloseStream(Qmx_CorrStream* stream) {
     const auto found = std::find(m_openStreams.begin(), m_openStreams.end(), stream);
     if (found == m_openStreams.end()) return;
     m_openStreams.erase(found);
+    const auto writer = m_portableWriters.find(stream);
+    if (writer != m_portableWriters.end()) {
+        const bool complete = static_cast<Qmx_CorrStream_UTStr*>(stream)->Close();
+        if (complete) {
+            m_incompleteStreams.erase(writer->second);
+        } else {
+            m_incompleteStreams.insert(writer->second);
+        }
+        m_portableWriters.erase(writer);
+    }
     delete stream;
 }
 
@@ -268,6 +280,9 @@ void Qmx_CorrDb_Internal::SetStreamSize(const Vesk::StringBase<char>& name, int 
 }
 
 void Qmx_CorrDb_Internal::Commit() const {
+    if (!m_incompleteStreams.empty()) {
+        QMX_CORR_THROW(CannotWriteDatabase, (m_tempDir + *m_incompleteStreams.begin()).c_str());
+    }
     for (Qmx_CorrStream* stream : m_openStreams) stream->Flush();
     // The new file is written beside the old one and renamed over it only when it is whole
     // and durable, so that the last committed file survives every failure and power loss.

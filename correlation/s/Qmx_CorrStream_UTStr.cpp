@@ -29,7 +29,13 @@ Qmx_CorrStream_UTStr::Qmx_CorrStream_UTStr(const Vesk::StringBase<char>& path, i
     if (!m_stream) QMX_CORR_THROW(CannotReadDatabase, path.c_str());
 }
 
-Qmx_CorrStream_UTStr::~Qmx_CorrStream_UTStr() { Vesk::File::close(m_stream); }
+Qmx_CorrStream_UTStr::~Qmx_CorrStream_UTStr() { Close(); }
+
+bool Qmx_CorrStream_UTStr::Close() {
+    const bool ok = Vesk::File::close(m_stream);
+    m_stream = nullptr;
+    return ok;
+}
 
 unsigned int Qmx_CorrStream_UTStr::GetPos() const {
     return static_cast<unsigned int>(m_stream->getfoffset());

@@ -288,6 +288,28 @@ TEST_F(CorrDbInternalTest, FailedCommitAtEveryOperationKeepsTheLastCommittedFile
     EXPECT_EQ(ReadFileBytes(DbPath()), after);
 }
 
+// A portable stream writes its compressed bytes when it is closed; a failure there must not
+// let the next commit pack the cut-off stream.
+TEST_F(CorrDbInternalTest, PortableStreamThatFailedToCloseStopsTheCommit) {
+    auto db = OpenDb();
+    Write(*db, "names", "first", 14);
+    db->Commit();
+    const std::string before = ReadFileBytes(DbPath());
+    Qmx_CorrStream* stream = db->OpenStream("names", 14);
+    stream->WriteString("second, never whole");
+    Vesk::FaultInjector::Arm(1);
+    db->CloseStream(stream);
+    Vesk::FaultInjector::Disarm();
+    EXPECT_THAT([&] { db->Commit(); },
+                ThrowsMessage<Qmx_CorrException::CannotWriteDatabase>(
+                    StrEq("Qmx_CorrException::CannotWriteDatabase. Unable to write '" +
+                          db->GetTempDir() + "names'.\n")));
+    EXPECT_EQ(ReadFileBytes(DbPath()), before);
+    Write(*db, "names", "third", 14);
+    db->Commit();
+    EXPECT_EQ(Read(*OpenDb(), "names", 9), "third");
+}
+
 TEST_F(CorrDbInternalTest, StreamOverFourGigabytesIsRefusedAndNothingChanges) {
     auto db = OpenDb();
     Write(*db, "a", "a");
