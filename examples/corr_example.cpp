@@ -1,10 +1,13 @@
 // A small tour of what the library offers so far: a traced operation, a compressed file
-// written and read back through the portability layer, and an error as a host receives it.
+// written and read back through the portability layer, a database file committed and opened
+// again, and an error as a host receives it.
 #include <cstdio>
 #include <iostream>
 
+#include "Qmx_CorrDb_Internal.h"
 #include "Qmx_CorrDbg.h"
 #include "Qmx_CorrException.h"
+#include "Qmx_CorrStream.h"
 #include "Vesk_File.h"
 #include "Vesk_Stream.h"
 
@@ -14,8 +17,8 @@ constexpr const char* kSourceFile = "examples/corr_example";
 constexpr const char* kRevision = "1";
 
 int Run(const Vesk::StringBase<char>& path) {
-    Qmx_CorrDbg::s_Tracer->SetTraceLevel("ARCHIVE", 10);
-    QMX_CORR_TRACE("ARCHIVE", 10, "Writing '" << path << "' in the compressed form.");
+    Qmx_CorrDbg::s_Tracer->SetTraceLevel("ARCHIVE", 5);
+    QMX_CORR_TRACE("ARCHIVE", 5, "Writing '" << path << "' in the compressed form.");
 
     Vesk::Stream* out = Vesk::File::open(path, Vesk::File::kWrite | Vesk::File::kCompressed, true);
     if (!out) QMX_CORR_THROW(CannotWriteDatabase, path.c_str());
@@ -31,6 +34,25 @@ int Run(const Vesk::StringBase<char>& path) {
     Vesk::File::close(in);
     std::cout << "read back: " << name << " " << value << " (" << Vesk::File::getsize_noopen(path)
               << " bytes on disk)\n";
+
+    const Vesk::StringBase<char> dbPath = path + ".cpd";
+    {
+        Qmx_CorrDb_Internal db(dbPath);
+        Qmx_CorrStream* stream = db.OpenStream("lineage", 6);
+        stream->WriteString("/syn/u_core/alu/add_3_reg[12] <- /rtl/u_core/alu/add_3");
+        stream->WriteUINT32(3);
+        db.CloseStream(stream);
+        db.Commit();
+    }
+    {
+        Qmx_CorrDb_Internal db(dbPath);
+        Qmx_CorrStream* stream = db.OpenStream("lineage", 1);
+        const Vesk::StringBase<char> text = stream->ReadString();
+        std::cout << "database " << dbPath << " (" << Vesk::File::getsize_noopen(dbPath)
+                  << " bytes) holds: " << text << " (stage " << stream->ReadUINT32() << ")\n";
+        db.CloseStream(stream);
+    }
+    Vesk::File::remove_f(dbPath);
 
     try {
         QMX_CORR_THROW(InvalidDatabaseFormat, path.c_str());
