@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "Vesk_Endian.h"
 #include "Vesk_IOException.h"
 
 namespace Vesk {
@@ -75,16 +76,14 @@ void Stream::writestring(const StringBase<char>& text) {
 void Stream::writestring(const char* text) { writestring(StringBase<char>(text)); }
 
 std::uint32_t Stream::readuint32() {
-    unsigned char bytes[4];
-    read(reinterpret_cast<char*>(bytes), 4);
-    return static_cast<std::uint32_t>(bytes[0]) | static_cast<std::uint32_t>(bytes[1]) << 8 |
-           static_cast<std::uint32_t>(bytes[2]) << 16 | static_cast<std::uint32_t>(bytes[3]) << 24;
+    char bytes[4];
+    read(bytes, 4);
+    return Vesk_Endian::DecodeUINT32LE(bytes);
 }
 
 void Stream::writeuint32(std::uint32_t value) {
-    const char bytes[4] = {static_cast<char>(value & 0xFF), static_cast<char>((value >> 8) & 0xFF),
-                           static_cast<char>((value >> 16) & 0xFF),
-                           static_cast<char>((value >> 24) & 0xFF)};
+    char bytes[4];
+    Vesk_Endian::EncodeUINT32LE(value, bytes);
     doWrite(bytes, 4);
 }
 

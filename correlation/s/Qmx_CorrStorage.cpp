@@ -5,6 +5,7 @@
 
 #include "Qmx_CorrException.h"
 #include "Qmx_CorrStream.h"
+#include "Vesk_Endian.h"
 
 namespace {
 
@@ -102,16 +103,14 @@ void Qmx_CorrStorage::WriteExpRelPtr(void* p) {
 }
 
 unsigned int Qmx_CorrStorage::ReadHandle() {
-    unsigned char bytes[4];
-    m_stream->read(reinterpret_cast<char*>(bytes), 4);
-    return static_cast<unsigned int>(bytes[0]) | static_cast<unsigned int>(bytes[1]) << 8 |
-           static_cast<unsigned int>(bytes[2]) << 16 | static_cast<unsigned int>(bytes[3]) << 24;
+    char bytes[4];
+    m_stream->read(bytes, 4);
+    return Vesk_Endian::DecodeUINT32LE(bytes);
 }
 
 void Qmx_CorrStorage::WriteHandle(unsigned int handle) {
-    const char bytes[4] = {
-        static_cast<char>(handle & 0xFF), static_cast<char>((handle >> 8) & 0xFF),
-        static_cast<char>((handle >> 16) & 0xFF), static_cast<char>((handle >> 24) & 0xFF)};
+    char bytes[4];
+    Vesk_Endian::EncodeUINT32LE(handle, bytes);
     m_stream->write(bytes, 4);
 }
 

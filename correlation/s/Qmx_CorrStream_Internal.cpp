@@ -5,6 +5,7 @@
 #include <iostream>
 
 #include "Qmx_CorrException.h"
+#include "Vesk_Endian.h"
 
 namespace {
 
@@ -122,16 +123,14 @@ void Qmx_CorrStream_Internal::WriteUINT8(unsigned char value) {
 }
 
 unsigned int Qmx_CorrStream_Internal::ReadUINT32() {
-    unsigned char bytes[4];
-    read(reinterpret_cast<char*>(bytes), 4);
-    return static_cast<unsigned int>(bytes[0]) | static_cast<unsigned int>(bytes[1]) << 8 |
-           static_cast<unsigned int>(bytes[2]) << 16 | static_cast<unsigned int>(bytes[3]) << 24;
+    char bytes[4];
+    read(bytes, 4);
+    return Vesk_Endian::DecodeUINT32LE(bytes);
 }
 
 void Qmx_CorrStream_Internal::WriteUINT32(unsigned int value) {
-    const char bytes[4] = {static_cast<char>(value & 0xFF), static_cast<char>((value >> 8) & 0xFF),
-                           static_cast<char>((value >> 16) & 0xFF),
-                           static_cast<char>((value >> 24) & 0xFF)};
+    char bytes[4];
+    Vesk_Endian::EncodeUINT32LE(value, bytes);
     write(bytes, 4);
 }
 
