@@ -108,6 +108,9 @@ QMX_CORR_EXPORT void Println(std::ostream& out, unsigned indent, const char* for
 // The indent of Println as text, in the shared dump buffer (valid until the next dump call).
 QMX_CORR_EXPORT const char* GetIndentString(unsigned indent);
 
+// The dump of an object with nothing to show inside: `head`, "{", "}" through Println.
+QMX_CORR_EXPORT void PrintEmptyBlock(std::ostream& out, unsigned indent, const std::string& head);
+
 // The readable name of a class for dump head lines, e.g. "Qmx_CorrDb_Internal".
 QMX_CORR_EXPORT std::string GetDumpName(const std::type_info& type);
 

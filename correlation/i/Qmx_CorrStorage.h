@@ -11,6 +11,7 @@
 #include "Qmx_CorrStorageData.h"
 #include "Vesk_StringBase.h"
 
+class Qmx_CorrContainer;
 class Qmx_CorrStream;
 
 class QMX_CORR_EXPORT Qmx_CorrStorage {
@@ -35,6 +36,7 @@ public:
 
     // Ordinal readers: an ordinal beyond its table is InvalidDatabaseFormat.
     Qmx_CorrManagedContainer* ReadManagedContainerPtr();
+    Qmx_CorrContainer* ReadContainerPtr();
     Qmx_CorrManagedImplicitRelationship* ReadManagedImpRelPtr();
     // REQUIRES: the table is sorted by std::less. Null writes 0; an object that is not in
     // the table throws InvalidRequest and writes nothing.

@@ -139,11 +139,8 @@ void Qmx_CorrDb_Gorsk::Commit() const {}
 bool Qmx_CorrDb_Gorsk::DbgValidateState() const { return true; }
 
 void Qmx_CorrDb_Gorsk::DbgDump(std::ostream& out, unsigned int indent) const {
-    Qmx_CorrDbg::Println(out, indent, "%s: '%s'",
-                         Qmx_CorrDbg::GetDumpName(typeid(Qmx_CorrDb_Gorsk)).c_str(),
-                         m_name.c_str());
-    Qmx_CorrDbg::Println(out, indent, "{");
-    Qmx_CorrDbg::Println(out, indent, "}");
+    Qmx_CorrDbg::PrintEmptyBlock(
+        out, indent, Qmx_CorrDbg::GetDumpName(typeid(Qmx_CorrDb_Gorsk)) + ": '" + m_name + "'");
 }
 
 void Qmx_CorrDb_Gorsk::DbgDump() const { DbgDump(std::cerr, 0); }

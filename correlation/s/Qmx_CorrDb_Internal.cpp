@@ -361,11 +361,8 @@ void Qmx_CorrDb_Internal::WriteCpdFile(const Vesk::StringBase<char>& path) const
 bool Qmx_CorrDb_Internal::DbgValidateState() const { return true; }
 
 void Qmx_CorrDb_Internal::DbgDump(std::ostream& out, unsigned int indent) const {
-    Qmx_CorrDbg::Println(out, indent, "%s: '%s'",
-                         Qmx_CorrDbg::GetDumpName(typeid(Qmx_CorrDb_Internal)).c_str(),
-                         m_name.c_str());
-    Qmx_CorrDbg::Println(out, indent, "{");
-    Qmx_CorrDbg::Println(out, indent, "}");
+    Qmx_CorrDbg::PrintEmptyBlock(
+        out, indent, Qmx_CorrDbg::GetDumpName(typeid(Qmx_CorrDb_Internal)) + ": '" + m_name + "'");
 }
 
 void Qmx_CorrDb_Internal::DbgDump() const { DbgDump(std::cerr, 0); }

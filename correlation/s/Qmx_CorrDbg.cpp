@@ -153,6 +153,12 @@ const char* GetIndentString(unsigned indent) {
     return g_dumpBuffer;
 }
 
+void PrintEmptyBlock(std::ostream& out, unsigned indent, const std::string& head) {
+    Println(out, indent, "%s", head.c_str());
+    Println(out, indent, "{");
+    Println(out, indent, "}");
+}
+
 std::string GetDumpName(const std::type_info& type) {
     int status = 0;
     char* readable = abi::__cxa_demangle(type.name(), nullptr, nullptr, &status);

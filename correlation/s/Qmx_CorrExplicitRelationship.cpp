@@ -1,0 +1,3 @@
+#include "Qmx_CorrExplicitRelationship.h"
+
+Qmx_CorrExplicitRelationship::~Qmx_CorrExplicitRelationship() = default;

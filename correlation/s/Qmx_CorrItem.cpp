@@ -1,0 +1,3 @@
+#include "Qmx_CorrItem.h"
+
+Qmx_CorrItem::~Qmx_CorrItem() = default;

@@ -1,0 +1,3 @@
+#include "Qmx_CorrRelationship.h"
+
+Qmx_CorrRelationship::~Qmx_CorrRelationship() = default;
