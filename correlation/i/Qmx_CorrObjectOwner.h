@@ -1,7 +1,7 @@
 // Qmx_CorrObjectOwner: the context of one open database, reached by every managed object
-// through its shared data. It holds the name repository (not owned), the two shared-data
-// managers (owned) and the container id counter, and declares the operations through which
-// objects create, link and delete one another; the data manager (Qmx_CorrDataMgr) is its one
+// through its shared data. It holds the name repository (owned only when it made it), the two
+// shared-data managers (owned) and the container id counter, and declares the operations through
+// which objects create, link and delete one another; the data manager (Qmx_CorrDataMgr) is its one
 // implementation, so that the managed objects depend on this interface only. No locking.
 #ifndef QMX_CORROBJECTOWNER_H
 #define QMX_CORROBJECTOWNER_H
@@ -84,16 +84,21 @@ protected:
     // passes its own). Then make the item data manager and the relationship data manager.
     Qmx_CorrObjectOwner();
     explicit Qmx_CorrObjectOwner(Qmx_CorrNameRepository* repo);
+    // With `privateRepo` set, a null `repo` gives this owner a Qmx_CorrNameRepo_Basic of its
+    // own, destroyed after the data managers: databases that share a repository share their
+    // string tables, so each database gets its own unless its host passes one.
+    Qmx_CorrObjectOwner(Qmx_CorrNameRepository* repo, bool privateRepo);
     // Not copyable: a copy would share the data managers, which each owner deletes, and they
     // point back at the owner that made them.
     Qmx_CorrObjectOwner(const Qmx_CorrObjectOwner&) = delete;
     Qmx_CorrObjectOwner& operator=(const Qmx_CorrObjectOwner&) = delete;
 
 private:
-    Qmx_CorrNameRepository* m_nameRepo;  // not owned
+    Qmx_CorrNameRepository* m_nameRepo;  // owned only when it is m_ownRepo
     Qmx_CorrItemDataMgr* m_itemDataMgr;  // owned
     Qmx_CorrRelDataMgr* m_relDataMgr;    // owned
     unsigned m_nextContainerId;
+    Qmx_CorrNameRepository* m_ownRepo;  // owned; null unless the owner made its repository
 };
 
 #endif
