@@ -5,22 +5,27 @@
 #ifndef QMX_SINGLEOPTCONTAINERT_H
 #define QMX_SINGLEOPTCONTAINERT_H
 #include <cstddef>
+#include <cstring>
 #include <new>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
 template <class T>
 class Qmx_SingleOptContainerT {
+    // The elements are pointers; the inline storage is cleared bytewise.
+    static_assert(std::is_trivially_copyable<T>::value, "elements must be trivially copyable");
+
 public:
     // The storage modes: no element, one element inline, two or more (or reserved for two
     // or more) in the vector.
     enum : unsigned int { kEmpty = 0, kSingle = 1, kVector = 2 };
 
-    Qmx_SingleOptContainerT() : m_mode(kEmpty), m_single() {}
-    Qmx_SingleOptContainerT(const Qmx_SingleOptContainerT& other) : m_mode(kEmpty), m_single() {
+    Qmx_SingleOptContainerT() : m_mode(kEmpty), m_raw() {}
+    Qmx_SingleOptContainerT(const Qmx_SingleOptContainerT& other) : m_mode(kEmpty), m_raw() {
         CopyFrom(other);
     }
-    Qmx_SingleOptContainerT(Qmx_SingleOptContainerT&& other) noexcept : m_mode(kEmpty), m_single() {
+    Qmx_SingleOptContainerT(Qmx_SingleOptContainerT&& other) noexcept : m_mode(kEmpty), m_raw() {
         MoveFrom(other);
     }
     Qmx_SingleOptContainerT& operator=(const Qmx_SingleOptContainerT& other) {
@@ -57,11 +62,14 @@ public:
             return;
         }
         if (m_mode == kSingle) {
-            const T first = m_single;
-            new (&m_many) std::vector<T>();
+            // Built aside first: if allocating fails, the list still holds its element.
+            std::vector<T> both;
+            both.reserve(2);
+            both.push_back(m_single);
+            both.push_back(value);
+            new (&m_many) std::vector<T>(std::move(both));
             m_mode = kVector;
-            m_many.reserve(2);
-            m_many.push_back(first);
+            return;
         }
         m_many.push_back(value);
     }
@@ -82,32 +90,41 @@ private:
     void Clear() {
         if (m_mode == kVector) m_many.~vector();
         m_mode = kEmpty;
-        m_single = T();
+        ZeroStorage();
     }
+    // Outside mode 2 every byte of the union is kept defined (zero, or the inline element),
+    // and each branch below sets the mode it built rather than copying the other's: the
+    // optimiser cannot always prove that the vector is read only in mode 2, and a read it
+    // thinks uninitialised becomes -Wmaybe-uninitialized, an error in builds with -Werror.
+    void ZeroStorage() { std::memset(static_cast<void*>(m_raw), 0, sizeof(m_raw)); }
+    // REQUIRES (both): this list is empty.
     void CopyFrom(const Qmx_SingleOptContainerT& other) {
         if (other.m_mode == kVector) {
             new (&m_many) std::vector<T>(other.m_many);
-        } else {
+            m_mode = kVector;
+        } else if (other.m_mode == kSingle) {
             m_single = other.m_single;
+            m_mode = kSingle;
         }
-        m_mode = other.m_mode;
     }
     void MoveFrom(Qmx_SingleOptContainerT& other) {
         if (other.m_mode == kVector) {
             new (&m_many) std::vector<T>(std::move(other.m_many));
             other.m_many.~vector();
-        } else {
+            m_mode = kVector;
+        } else if (other.m_mode == kSingle) {
             m_single = other.m_single;
+            m_mode = kSingle;
         }
-        m_mode = other.m_mode;
         other.m_mode = kEmpty;
-        other.m_single = T();
+        other.ZeroStorage();
     }
 
     unsigned int m_mode;
     union {
-        T m_single;             // mode 1
-        std::vector<T> m_many;  // mode 2
+        T m_single;                                   // mode 1
+        std::vector<T> m_many;                        // mode 2
+        unsigned char m_raw[sizeof(std::vector<T>)];  // modes 0 and 1: all bytes defined
     };
 };
 

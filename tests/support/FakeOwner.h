@@ -17,6 +17,9 @@ class FakeOwner : public Qmx_CorrObjectOwner {
 public:
     FakeOwner() = default;
     explicit FakeOwner(Qmx_CorrNameRepository* repo) : Qmx_CorrObjectOwner(repo) {}
+    // As the data manager does: a later owner at the same address must not inherit this one's
+    // default container record.
+    ~FakeOwner() override { Qmx_CorrObjectData::ReleaseDefaultObjectData(this); }
 
     void LinkRelationshipItem(Qmx_CorrExplicitRelationship*, Qmx_CorrItem*, unsigned) override {}
     void UnlinkRelationshipItem(Qmx_CorrExplicitRelationship*, Qmx_CorrItem*, unsigned) override {}
