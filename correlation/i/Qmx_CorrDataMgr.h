@@ -1,7 +1,7 @@
 // Qmx_CorrDataMgr: everything of one open database behind a Qmx_CorrMgr: the container tree,
 // the implicit relationships, the pool managers of items and explicit relationships, the
 // overflow-list managers, the shared-data managers and the name repository (its own unless the
-// host passes one), and, for a database with a file, the archive. It is the one implementation
+// host passes one). It is the one implementation
 // of Qmx_CorrObjectOwner, through which every managed object creates, links and deletes
 // others, and it keeps the modified flag: every change of the graph sets it, a commit clears
 // it. Owned by its Qmx_CorrMgr. One thread at a time.
@@ -18,7 +18,6 @@
 #include "Qmx_CorrObjectOwner.h"
 #include "Vesk_StringBase.h"
 
-class Qmx_CorrArchive;
 class Qmx_CorrMgr;
 
 class QMX_CORR_EXPORT Qmx_CorrDataMgr : public Qmx_CorrObjectOwner {
@@ -53,9 +52,9 @@ public:
     virtual void DbgDump(std::ostream& out, unsigned indent) const;
     virtual void DbgDump() const;
 
-    // Opens `dbName` (nothing when it is empty); `repo` null gives the database a private
-    // name repository. A new writable database is committed before the constructor returns.
-    // Errors of opening leave the constructor and nothing survives.
+    // A database without a file when `dbName` is empty; `repo` null gives the database a
+    // private name repository. Database files are not opened yet: a non-empty `dbName`
+    // throws CannotReadDatabase with the name, so that nothing is taken for saved that is not.
     Qmx_CorrDataMgr(const Vesk::StringBase<char>& dbName, const Vesk::StringBase<char>& tempDir,
                     bool readOnly, Qmx_CorrNameRepository* repo);
     Qmx_CorrDataMgr(const Qmx_CorrDataMgr&) = delete;
@@ -74,8 +73,10 @@ public:
         const char* dstFormat);
 
     // Writes the database when it is modified, writable and has a file; clears modified.
+    // Without a file nothing happens.
     void Commit();
     // With a file: the containers' item lists, then every pool, written and unloaded.
+    // Without a file nothing happens.
     void FlushAll();
 
     bool IsModified() const { return m_modified; }
@@ -90,7 +91,8 @@ public:
     Qmx_CorrMgr* GetCorrMgr() const { return m_corrMgr; }
 
 private:
-    void DestroyTree();
+    // Items and relationships given by a host through the abstract interfaces.
+    Qmx_CorrManagedItem* AsItem(Qmx_CorrItem* item) const;
 
     Qmx_CorrManagedContainer* m_top;                                            // owned
     std::vector<Qmx_CorrManagedImplicitRelationship*> m_implicitRelationships;  // owned
@@ -98,7 +100,6 @@ private:
     Vesk::StringBase<char> m_tempDir;
     bool m_readOnly;
     bool m_modified;
-    Qmx_CorrArchive* m_archive;  // owned; null without a file
     std::unique_ptr<Qmx_CorrManagedItemMgr> m_itemMgr;
     std::unique_ptr<Qmx_CorrManagedExpRelMgr> m_expRelMgr;
     Qmx_CorrMgr* m_corrMgr;  // not owned

@@ -22,6 +22,7 @@
 #define QMX_CORRMANAGEDCONTAINER_H
 #include <boost/shared_ptr.hpp>
 #include <iosfwd>
+#include <utility>
 #include <vector>
 
 #include "QmxCorrExport.h"
@@ -30,13 +31,18 @@
 #include "Qmx_CorrObjectData.h"
 
 class Qmx_CorrManagedItem;
+class Qmx_CorrNameRepository;
 class Qmx_CorrObjectOwner;
 class Qmx_CorrStorage;
+class Qmx_CorrStream;
 
 class QMX_CORR_EXPORT Qmx_CorrManagedContainer : public Qmx_CorrContainer {
 public:
-    // Fires the container-deleted event, destroys the children (each firing in turn), then
-    // gives the name back, so that a listener can still read this container whole.
+    // Fires the container-deleted event for this container and then for every container
+    // beneath it (parents first, children in list order) before anything is destroyed; then
+    // destroys the children and gives the name back last. So a listener, also one of a
+    // closing database, reads every container of the subtree whole, the other ends of its
+    // implicit relationships included.
     ~Qmx_CorrManagedContainer() override;
 
     // A new container with the owner's default object data and the owner's next container id;
@@ -44,7 +50,8 @@ public:
     Qmx_CorrManagedContainer(const Vesk::StringBase<char>& name, Qmx_CorrObjectOwner* owner,
                              Qmx_CorrManagedContainer* parent);
     // Reads one record; the items stay unloaded. Throws InvalidDatabaseFormat (storage name)
-    // unless the storage's containerVersion is 1, or when a count exceeds the bytes left.
+    // unless the storage's containerVersion is 1, when a count exceeds the bytes left, and for
+    // itself as its parent, a null, repeated or own child or a null implicit relationship.
     Qmx_CorrManagedContainer(Qmx_CorrStorage& storage, Qmx_CorrObjectOwner* owner);
     Qmx_CorrManagedContainer(const Qmx_CorrManagedContainer&) = delete;
     Qmx_CorrManagedContainer& operator=(const Qmx_CorrManagedContainer&) = delete;
@@ -68,7 +75,10 @@ public:
     // relationships at this container, then the container itself, which must not be used
     // afterwards.
     void Delete(unsigned relMode) override;
+    // Should one Delete throw, the children (items) deleted before it have left the list and
+    // the one that threw stays in it; the removal notices are heard again either way.
     void DeleteContainers(unsigned relMode) override;
+    // relMode above 3 is taken as 0.
     void DeleteItems(unsigned relMode) override;
     using Qmx_CorrContainer::GetContainer;
     Qmx_CorrContainer* GetContainer(const Vesk::StringBase<char>& name) override;
@@ -112,11 +122,33 @@ public:
     void FlushAll(bool flushPools) const;
 
 private:
+    using ItemIterator = std::vector<Qmx_CorrManagedItem*>::iterator;
+    using ItemRange = std::pair<ItemIterator, ItemIterator>;
+
+    Qmx_CorrNameRepository* GetRepo() const;
+    Qmx_CorrManagedContainer* FindChild(Qmx_CorrNameHandle name) const;
+    // The equal range of `name` in the item list. REQUIRES: the items are loaded.
+    ItemRange FindItems(Qmx_CorrNameHandle name) const;
     // The items list is a cache of the items stream, filled and dropped by const operations.
+    // A stream that does not open leaves the list unloaded; a damaged one (a count beyond its
+    // bytes, a handle of no item or of another container's item, names out of order) throws
+    // InvalidDatabaseFormat with the database name and leaves it unloaded too.
     void LoadItems() const;
+    void ReadItemsStream(Qmx_CorrStream& stream, const Vesk::StringBase<char>& dbName) const;
+    // Throws CannotWriteDatabase (stream name) when the stream cannot be opened: dropping a
+    // list that was not written would lose the items.
     void WriteItemsStream() const;
-    Qmx_CorrItem* InsertNewItem(std::vector<Qmx_CorrManagedItem*>::iterator at,
-                                Qmx_CorrNameHandle name);
+    Qmx_CorrItem* InsertNewItem(ItemIterator at, Qmx_CorrNameHandle name);
+    // The self-checks of RenameItem, sent as debug output only.
+    bool CheckItemOrder(const char* label) const;
+    void CheckRenamed(const Qmx_CorrManagedItem* item, const Vesk::StringBase<char>& oldName,
+                      const Vesk::StringBase<char>& newName) const;
+    // Each implicit relationship at this container, through its own Delete, so that its data
+    // is released and the other container forgets it too.
+    void DeleteImplicitRelationships();
+    void ReadRestoredLists(Qmx_CorrStorage& storage);
+    // The container-deleted event of this container and of those beneath it, once each.
+    void NotifyDeletion();
 
     boost::shared_ptr<Qmx_CorrObjectData> m_data;
     Qmx_CorrManagedContainer* m_parent;                     // not owned; null for the top container
@@ -126,6 +158,7 @@ private:
     std::vector<Qmx_CorrImplicitRelationship*> m_outgoing;  // not owned
     std::vector<Qmx_CorrImplicitRelationship*> m_incoming;  // not owned
     bool m_notifyOnRemove;
+    bool m_deletionNotified;  // the container-deleted event has been fired for this one
     mutable bool m_itemsLoaded;
     mutable bool m_itemsStreamCurrent;  // the items stream holds exactly m_items
     Vesk::StringBase<char> m_itemsStreamName;

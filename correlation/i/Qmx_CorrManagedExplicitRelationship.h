@@ -36,7 +36,9 @@ public:
     // No items; the relationship data manager's default data.
     explicit Qmx_CorrManagedExplicitRelationship(Qmx_CorrObjectOwner* owner);
     // Reads one record. Throws InvalidDatabaseFormat (storage name) unless the storage's
-    // expRelVersion is 1 or when the data index names a free slot.
+    // expRelVersion is 1, when fewer bytes than a record are left, when the data index names a
+    // free slot or none, when a handle is below 128, or when a side of three or more finds a
+    // different number of handles in the overflow lists.
     Qmx_CorrManagedExplicitRelationship(Qmx_CorrStorage& storage, Qmx_CorrObjectOwner* owner);
     Qmx_CorrManagedExplicitRelationship(const Qmx_CorrManagedExplicitRelationship&) = delete;
     Qmx_CorrManagedExplicitRelationship& operator=(const Qmx_CorrManagedExplicitRelationship&) =
@@ -50,12 +52,15 @@ public:
     bool DbgValidateState() const override;
     void DbgDump(std::ostream& out, unsigned indent) const override;
     void DbgDump() const override;
+    // The item lists leave out handles that name no live item (only a damaged database has
+    // them), so that no caller meets a null.
     Qmx_SingleOptContainerT<const Qmx_CorrItem*> GetSrcItems() const override;
     Qmx_SingleOptContainerT<Qmx_CorrItem*> GetSrcItems() override;
     Qmx_SingleOptContainerT<const Qmx_CorrItem*> GetDstItems() const override;
     Qmx_SingleOptContainerT<Qmx_CorrItem*> GetDstItems() override;
-    // Throws InvalidSrcItem for null, SrcAndDstIdentical when the item is a destination
-    // (nothing changes); an item that is already a source is left as it is.
+    // Throws InvalidSrcItem for null (short form) and for an item that is not in this
+    // database's pools (with its absolute name), SrcAndDstIdentical when the item is a
+    // destination; nothing changes then. An item that is already a source is left as it is.
     void AddSrcItem(Qmx_CorrItem* item) override;
     // Removing an item that is not a source changes nothing; an empty side is kept.
     void RemoveSrcItem(Qmx_CorrItem* item) override;

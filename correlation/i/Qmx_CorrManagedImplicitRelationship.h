@@ -83,11 +83,14 @@ public:
     // that must not create again where it has created once uses these.
     Qmx_CorrItem* MapToDst(const Qmx_CorrItem* srcItem, bool allowCreate);
     Qmx_CorrItem* MapToSrc(const Qmx_CorrItem* dstItem, bool allowCreate);
-    // The name with the transform applied (unchanged without one).
+    // The name with the transform applied (unchanged without one). Throws BadExpression (the
+    // expression) when the matcher gives up on the name, as a pathological expression can.
     Vesk::StringBase<char> TransformName(const Vesk::StringBase<char>& name) const;
     void Archive(Qmx_CorrStorage& storage) const;
 
 private:
+    // The expression and format of a stored transform.
+    void ReadTransform(Qmx_CorrStorage& storage);
     // The counterpart of `item` beneath `anchor`, mirrored beneath `side`; an item outside
     // `anchor` throws InvalidSrcItem (itemIsSource) or InvalidDstItem with its absolute name.
     Qmx_CorrItem* MapItem(const Qmx_CorrItem* item, const Qmx_CorrContainer* anchor,

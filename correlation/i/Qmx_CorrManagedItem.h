@@ -42,7 +42,9 @@ public:
     Qmx_CorrManagedItem(Qmx_CorrNameHandle name, Qmx_CorrObjectOwner* owner,
                         Qmx_CorrContainer* parent);
     // Reads one record. Throws InvalidDatabaseFormat (storage name) unless the storage's
-    // itemVersion is 2 or when the data index names a free slot.
+    // itemVersion is 2, when fewer bytes than a record are left, when the data index names a
+    // free slot or none, when an inline handle is below 128, or when a list of two or more
+    // finds a different number of handles in the overflow lists.
     Qmx_CorrManagedItem(Qmx_CorrStorage& storage, Qmx_CorrObjectOwner* owner);
     Qmx_CorrManagedItem(const Qmx_CorrManagedItem&) = delete;
     Qmx_CorrManagedItem& operator=(const Qmx_CorrManagedItem&) = delete;
@@ -58,6 +60,8 @@ public:
     Vesk::StringBase<char> GetAbsoluteName() const override;
     const Qmx_CorrContainer* GetParent() const override;
     Qmx_CorrContainer* GetParent() override;
+    // The relationship lists leave out handles that name no live relationship (only a damaged
+    // database has them), so that no caller meets a null.
     Qmx_SingleOptContainerT<const Qmx_CorrExplicitRelationship*> GetOutgoingRelationships()
         const override;
     Qmx_SingleOptContainerT<Qmx_CorrExplicitRelationship*> GetOutgoingRelationships() override;

@@ -13,7 +13,7 @@
 
 class Qmx_CorrNameRepo_Basic;
 
-class QMX_CORR_EXPORT Qmx_CorrName_Basic : public Qmx_CorrName {
+class QMX_CORR_EXPORT Qmx_CorrName_Basic final : public Qmx_CorrName {
 public:
     ~Qmx_CorrName_Basic() override;
     Qmx_CorrName_Basic(const Qmx_CorrName_Basic&) = delete;

@@ -480,13 +480,19 @@ private:
         return reusable != m_poolsWithFreeSlots.end() && reusable->second.Contains(index);
     }
 
+    // Objects are mostly looked up near the one before (a container's items, a chain of
+    // relationships), so the last range found is tried before the map.
     const LoadedRange* FindRange(const T* object) const {
         if (!object || m_loadedPools.empty()) return nullptr;
         const std::uintptr_t address = reinterpret_cast<std::uintptr_t>(object);
+        if (m_lastRange && address >= m_lastRange->begin && address < m_lastRange->end)
+            return m_lastRange;
         auto next = m_loadedPools.upper_bound(address);
         if (next == m_loadedPools.begin()) return nullptr;
         const LoadedRange& range = (--next)->second;
-        return address < range.end ? &range : nullptr;
+        if (address >= range.end) return nullptr;
+        m_lastRange = &range;
+        return &range;
     }
 
     void Register(const PoolT* pool, unsigned int index) {
@@ -495,6 +501,7 @@ private:
     }
 
     void Unregister(const PoolT* pool, unsigned int index) {
+        m_lastRange = nullptr;
         m_loadedPools.erase(pool->StorageBegin());
         auto loaded = m_loadedByContainer.find(pool->GetContainerId());
         if (loaded == m_loadedByContainer.end()) return;
@@ -515,6 +522,7 @@ private:
         for (PoolT* pool : m_pools) delete pool;
         m_pools.clear();
         m_loadedPools.clear();
+        m_lastRange = nullptr;
         m_loadedByContainer.clear();
         m_poolsWithFreeSlots.clear();
         if (m_storage) {
@@ -682,6 +690,7 @@ private:
     Qmx_CorrObjectOwner* m_owner;                // handed to every restored object
     // Object storage of each pool in memory, by its first address.
     std::map<std::uintptr_t, LoadedRange> m_loadedPools;
+    mutable const LoadedRange* m_lastRange = nullptr;  // into m_loadedPools, or null
     // Pools of each container id that may have a free slot; kReuseKey: emptied pools.
     std::map<unsigned int, PoolIndexStack> m_poolsWithFreeSlots;
     // The indices of the pools in memory, by container id, so that flushing one container's

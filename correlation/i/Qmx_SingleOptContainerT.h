@@ -21,6 +21,12 @@ public:
     // or more) in the vector.
     enum : unsigned int { kEmpty = 0, kSingle = 1, kVector = 2 };
 
+    // As a standard container names them, so that generic code and test matchers take it.
+    typedef T value_type;
+    typedef T* iterator;
+    typedef const T* const_iterator;
+    typedef std::size_t size_type;
+
     Qmx_SingleOptContainerT() : m_mode(kEmpty), m_raw() {}
     Qmx_SingleOptContainerT(const Qmx_SingleOptContainerT& other) : m_mode(kEmpty), m_raw() {
         CopyFrom(other);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cassert>
 #include <cstdint>
+#include <typeinfo>
 
 #include "Qmx_CorrDb.h"
 #include "Qmx_CorrDbg.h"
@@ -20,8 +21,12 @@ constexpr unsigned kTraceLevel = 10;
 // Even an empty string takes its 4-byte length.
 constexpr std::int64_t kMinStringBytes = 4;
 
+// Every comparison of names passes here, so the exact type is compared rather than searched
+// for with dynamic_cast; the record class is final, so the answers are the same.
 Qmx_CorrName_Basic* AsBasic(Qmx_CorrNameHandle name) {
-    return dynamic_cast<Qmx_CorrName_Basic*>(name.GetRecord());
+    Qmx_CorrName* record = name.GetRecord();
+    if (!record || typeid(*record) != typeid(Qmx_CorrName_Basic)) return nullptr;
+    return static_cast<Qmx_CorrName_Basic*>(record);
 }
 
 // The lowest empty slot above slot 0 from `from` on, or 0 when there is none.

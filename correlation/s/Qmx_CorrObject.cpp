@@ -6,11 +6,17 @@
 #include "Qmx_CorrDbg.h"
 #include "Qmx_CorrException.h"
 #include "Qmx_CorrObjectData.h"
+#include "Qmx_CorrObjectOwner.h"
 #include "Qmx_CorrPropertyRegistry.h"
 
 namespace {
 const char* const kSourceFile = "s/Qmx_CorrObject";
 const char* const kRevision = "1";
+
+// Property changes are changes of the database: a commit must write them.
+void MarkModified(Qmx_CorrObjectData* data) {
+    if (data->GetOwner()) data->GetOwner()->SetModified();
+}
 
 void CheckAccessor(const Vesk::StringBase<char>& name, const char* accessor) {
     if (!Qmx_CorrPropertyRegistry::GetInstance().IsProperAccessor(name, accessor))
@@ -63,6 +69,7 @@ void Qmx_CorrObject::SetProperty_INT32(const Vesk::StringBase<char>& name, int v
     Qmx_CorrObjectData* data = GetObjectDataForWrite();
     CheckAccessor(name, accessor);
     data->GetPropertiesForWrite()[name].SetINT32(value);
+    MarkModified(data);
 }
 
 void Qmx_CorrObject::SetProperty_String(const Vesk::StringBase<char>& name,
@@ -72,10 +79,13 @@ void Qmx_CorrObject::SetProperty_String(const Vesk::StringBase<char>& name,
     Qmx_CorrObjectData* data = GetObjectDataForWrite();
     CheckAccessor(name, accessor);
     data->GetPropertiesForWrite()[name].SetString(copy);
+    MarkModified(data);
 }
 
 void Qmx_CorrObject::DestroyProperty(const Vesk::StringBase<char>& name, const char* accessor) {
     if (!HasProperty(name)) return;
     CheckAccessor(name, accessor);
-    GetObjectDataForWrite()->GetPropertiesForWrite().erase(name);
+    Qmx_CorrObjectData* data = GetObjectDataForWrite();
+    data->GetPropertiesForWrite().erase(name);
+    MarkModified(data);
 }

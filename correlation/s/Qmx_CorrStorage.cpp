@@ -4,6 +4,7 @@
 #include <functional>
 
 #include "Qmx_CorrException.h"
+#include "Qmx_CorrManagedContainer.h"
 #include "Qmx_CorrStream.h"
 #include "Vesk_Endian.h"
 
@@ -61,12 +62,7 @@ Qmx_CorrManagedContainer* Qmx_CorrStorage::ReadManagedContainerPtr() {
     return m_data.containers[ReadOrdinal(m_data.containers.size())];
 }
 
-// The tables hold managed containers, each a Qmx_CorrContainer at the same address (single
-// inheritance), which the void* writers rely on as well; the cast keeps this reader free of
-// the managed container's definition.
-Qmx_CorrContainer* Qmx_CorrStorage::ReadContainerPtr() {
-    return reinterpret_cast<Qmx_CorrContainer*>(ReadManagedContainerPtr());
-}
+Qmx_CorrContainer* Qmx_CorrStorage::ReadContainerPtr() { return ReadManagedContainerPtr(); }
 
 Qmx_CorrManagedImplicitRelationship* Qmx_CorrStorage::ReadManagedImpRelPtr() {
     return m_data.implicitRelationships[ReadOrdinal(m_data.implicitRelationships.size())];

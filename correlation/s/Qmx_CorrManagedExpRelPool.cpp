@@ -1,0 +1,3 @@
+#include "Qmx_CorrManagedExpRelPool.h"
+
+Qmx_CorrManagedExpRelPool::~Qmx_CorrManagedExpRelPool() = default;

@@ -1,0 +1,3 @@
+#include "Qmx_CorrManagedItemPool.h"
+
+Qmx_CorrManagedItemPool::~Qmx_CorrManagedItemPool() = default;
