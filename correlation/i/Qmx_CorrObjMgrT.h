@@ -50,6 +50,7 @@
 #include "Qmx_CorrStorage.h"
 #include "Qmx_CorrStorageData.h"
 #include "Qmx_CorrStream.h"
+#include "Qmx_CorrStreamCloser.h"
 #include "Qmx_ObjectPoolT.h"
 
 class Qmx_CorrObjectOwner;
@@ -447,18 +448,6 @@ private:
         unsigned int baseHandle;  // handle of slot 0
     };
 
-    // Gives a stream back to its database at the end of the scope, thrown through or not.
-    class StreamCloser {
-    public:
-        StreamCloser(Qmx_CorrDb* db, Qmx_CorrStream* stream) : m_db(db), m_stream(stream) {}
-        ~StreamCloser() { m_db->CloseStream(m_stream); }
-        StreamCloser(const StreamCloser&) = delete;
-        StreamCloser& operator=(const StreamCloser&) = delete;
-
-    private:
-        Qmx_CorrDb* m_db;
-        Qmx_CorrStream* m_stream;
-    };
 
     static unsigned int BaseHandle(unsigned int index) { return (index + 1) * kPoolSize; }
 
@@ -542,7 +531,7 @@ private:
         Qmx_CorrStream* stream =
             m_db->OpenStream(m_dataName, Qmx_CorrDb::kRead | Qmx_CorrDb::kPortable);
         if (!stream) return;
-        StreamCloser closer(m_db, stream);
+        Qmx_CorrStreamCloser closer(m_db, stream);
         Qmx_CorrStorage storage(DbName(), stream, data);
         if (storage.ReadUINT32() != 0) QMX_CORR_THROW(InvalidDatabaseFormat, DbName().c_str());
         const unsigned int entries = storage.ReadUINT32();
@@ -658,7 +647,7 @@ private:
         Qmx_CorrStream* stream = m_db->OpenStream(
             m_dataName, Qmx_CorrDb::kWrite | Qmx_CorrDb::kTruncate | Qmx_CorrDb::kPortable);
         if (!stream) QMX_CORR_THROW(CannotWriteDatabase, m_dataName.c_str());
-        StreamCloser closer(m_db, stream);
+        Qmx_CorrStreamCloser closer(m_db, stream);
         stream->WriteUINT32(0);
         stream->WriteUINT32(static_cast<unsigned int>(m_poolsWithFreeSlots.size()));
         for (const auto& entry : m_poolsWithFreeSlots) {

@@ -16,6 +16,7 @@
 #include "Qmx_CorrNameRepository.h"
 #include "Qmx_CorrObjectOwner.h"
 #include "Qmx_CorrStorage.h"
+#include "Qmx_CorrStreamCloser.h"
 #include "Qmx_CorrStorageData.h"
 #include "Qmx_CorrStream.h"
 #include "Vesk_Endian.h"
@@ -73,18 +74,6 @@ private:
     bool m_saved;
 };
 
-// Gives an opened stream back to its database on every way out.
-class StreamCloser {
-public:
-    StreamCloser(Qmx_CorrDb* db, Qmx_CorrStream* stream) : m_db(db), m_stream(stream) {}
-    ~StreamCloser() { m_db->CloseStream(m_stream); }
-    StreamCloser(const StreamCloser&) = delete;
-    StreamCloser& operator=(const StreamCloser&) = delete;
-
-private:
-    Qmx_CorrDb* m_db;
-    Qmx_CorrStream* m_stream;
-};
 
 // The first name that occurs twice in `names`, or null.
 const Vesk::StringBase<char>* FindDuplicate(std::vector<Vesk::StringBase<char>>& names) {
@@ -596,7 +585,7 @@ void Qmx_CorrManagedContainer::LoadItems() const {
     if (!db) return;
     Qmx_CorrStream* const stream = db->OpenStream(m_itemsStreamName, kItemsReadMode);
     if (!stream) return;
-    const StreamCloser closer(db, stream);
+    const Qmx_CorrStreamCloser closer(db, stream);
     ReadItemsStream(*stream, db->GetName());
     m_itemsStreamCurrent = true;
     m_itemsLoaded = true;
@@ -635,7 +624,7 @@ void Qmx_CorrManagedContainer::WriteItemsStream() const {
     Qmx_CorrDb* const db = GetOwner()->GetDatabase();
     Qmx_CorrStream* const stream = db->OpenStream(m_itemsStreamName, kItemsWriteMode);
     if (!stream) QMX_CORR_THROW(CannotWriteDatabase, m_itemsStreamName.c_str());
-    const StreamCloser closer(db, stream);
+    const Qmx_CorrStreamCloser closer(db, stream);
     std::string handles(m_items.size() * kHandleSize, '\0');
     for (std::size_t i = 0; i < m_items.size(); ++i)
         Vesk_Endian::EncodeUINT32LE(GetOwner()->GetItemHandle(m_items[i]),
