@@ -1,7 +1,7 @@
 // Qmx_CorrDataMgr: everything of one open database behind a Qmx_CorrMgr: the container tree,
 // the implicit relationships, the pool managers of items and explicit relationships, the
 // overflow-list managers, the shared-data managers and the name repository (its own unless the
-// host passes one). It is the one implementation
+// host passes one) and, for a database with a file, the archive. It is the one implementation
 // of Qmx_CorrObjectOwner, through which every managed object creates, links and deletes
 // others, and it keeps the modified flag: every change of the graph sets it, a commit clears
 // it. Owned by its Qmx_CorrMgr. One thread at a time.
@@ -18,6 +18,7 @@
 #include "Qmx_CorrObjectOwner.h"
 #include "Vesk_StringBase.h"
 
+class Qmx_CorrArchive;
 class Qmx_CorrMgr;
 
 class QMX_CORR_EXPORT Qmx_CorrDataMgr : public Qmx_CorrObjectOwner {
@@ -52,9 +53,12 @@ public:
     virtual void DbgDump(std::ostream& out, unsigned indent) const;
     virtual void DbgDump() const;
 
-    // A database without a file when `dbName` is empty; `repo` null gives the database a
-    // private name repository. Database files are not opened yet: a non-empty `dbName`
-    // throws CannotReadDatabase with the name, so that nothing is taken for saved that is not.
+    // Opens the database file `dbName`, or none when it is empty. A missing file is created
+    // and committed before the constructor returns, unless `readOnly`: a read-only database
+    // whose file is missing is empty and has no file. `tempDir`, when not empty, is where the
+    // database makes its own temporary directory; `repo` null gives the database a private
+    // name repository. Errors of opening leave the constructor; nothing of it survives and
+    // the file is left as it was.
     Qmx_CorrDataMgr(const Vesk::StringBase<char>& dbName, const Vesk::StringBase<char>& tempDir,
                     bool readOnly, Qmx_CorrNameRepository* repo);
     Qmx_CorrDataMgr(const Qmx_CorrDataMgr&) = delete;
@@ -91,6 +95,10 @@ public:
     Qmx_CorrMgr* GetCorrMgr() const { return m_corrMgr; }
 
 private:
+    void Open();
+    void TakeImplicitRelationships();
+    // Everything in the order the destructor gives; also undoes a failed Open.
+    void Close();
     // Items and relationships given by a host through the abstract interfaces.
     Qmx_CorrManagedItem* AsItem(Qmx_CorrItem* item) const;
 
@@ -100,6 +108,7 @@ private:
     Vesk::StringBase<char> m_tempDir;
     bool m_readOnly;
     bool m_modified;
+    std::unique_ptr<Qmx_CorrArchive> m_archive;  // null without a file
     std::unique_ptr<Qmx_CorrManagedItemMgr> m_itemMgr;
     std::unique_ptr<Qmx_CorrManagedExpRelMgr> m_expRelMgr;
     Qmx_CorrMgr* m_corrMgr;  // not owned

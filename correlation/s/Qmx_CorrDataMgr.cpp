@@ -4,6 +4,7 @@
 #include <iostream>
 #include <typeinfo>
 
+#include "Qmx_CorrArchive.h"
 #include "Qmx_CorrDbg.h"
 #include "Qmx_CorrException.h"
 #include "Qmx_CorrItemDataMgr.h"
@@ -14,6 +15,7 @@
 #include "Qmx_CorrManagedItem.h"
 #include "Qmx_CorrObjectData.h"
 #include "Qmx_CorrRelItemOverflowMgr.h"
+#include "Vesk_File.h"
 #include "Vesk_MsgManData.h"
 
 namespace {
@@ -43,22 +45,51 @@ Qmx_CorrDataMgr::Qmx_CorrDataMgr(const Vesk::StringBase<char>& dbName,
       m_readOnly(readOnly),
       m_modified(false),
       m_corrMgr(nullptr) {
-    if (!m_dbName.empty()) QMX_CORR_THROW(CannotReadDatabase, m_dbName.c_str());
+    try {
+        Open();
+    } catch (...) {
+        Close();
+        throw;
+    }
+}
+
+void Qmx_CorrDataMgr::Open() {
     m_itemMgr.reset(new Qmx_CorrManagedItemMgr(Qmx_CorrManagedItem::GetArchiveSize(this)));
     m_expRelMgr.reset(
         new Qmx_CorrManagedExpRelMgr(Qmx_CorrManagedExplicitRelationship::GetArchiveSize(this)));
     m_itemRelOverflow.reset(new Qmx_CorrItemRelOverflowMgr(m_itemMgr->GetNewSwizzler()));
     m_relItemOverflow.reset(new Qmx_CorrRelItemOverflowMgr(m_expRelMgr->GetNewSwizzler()));
-    m_top = new Qmx_CorrManagedContainer("/", this, nullptr);
-    if (!m_readOnly) m_modified = true;
+    if (!m_dbName.empty() && (!m_readOnly || Vesk::File::exist(m_dbName.c_str()))) {
+        m_archive.reset(new Qmx_CorrArchive(m_dbName, m_tempDir, m_itemMgr.get(), m_expRelMgr.get(),
+                                            m_itemRelOverflow.get(), m_relItemOverflow.get(),
+                                            this));
+        m_top = m_archive->GetTopContainer();
+        if (m_top) TakeImplicitRelationships();
+    }
+    if (!m_top) m_top = new Qmx_CorrManagedContainer("/", this, nullptr);
+    if (m_readOnly) return;
+    m_modified = true;
+    if (m_archive) Commit();
 }
 
-Qmx_CorrDataMgr::~Qmx_CorrDataMgr() {
+void Qmx_CorrDataMgr::TakeImplicitRelationships() {
+    const unsigned int count = m_archive->GetNumImplicitRelationships();
+    m_implicitRelationships.reserve(count);
+    for (unsigned int i = 0; i < count; ++i) {
+        if (Qmx_CorrManagedImplicitRelationship* rel = m_archive->GetImplicitRelationship(i))
+            m_implicitRelationships.push_back(rel);
+    }
+}
+
+Qmx_CorrDataMgr::~Qmx_CorrDataMgr() { Close(); }
+
+void Qmx_CorrDataMgr::Close() {
     // The tree first, while everything its listeners may look at is still there.
     delete m_top;
     m_top = nullptr;
     for (Qmx_CorrManagedImplicitRelationship* rel : m_implicitRelationships) delete rel;
     m_implicitRelationships.clear();
+    m_archive.reset();
     m_itemMgr.reset();
     m_expRelMgr.reset();
     m_itemRelOverflow.reset();
@@ -138,7 +169,9 @@ Qmx_CorrManagedItem* Qmx_CorrDataMgr::CreateManagedItem(Qmx_CorrNameHandle name,
     return m_itemMgr->CreateManagedItem(name, this, parent, containerId);
 }
 
-Qmx_CorrDb* Qmx_CorrDataMgr::GetDatabase() { return nullptr; }
+Qmx_CorrDb* Qmx_CorrDataMgr::GetDatabase() {
+    return m_archive ? m_archive->GetDatabase() : nullptr;
+}
 
 const Qmx_CorrManagedItem* Qmx_CorrDataMgr::GetItemPtr(unsigned handle) const {
     return m_itemMgr->GetPtr(handle);
@@ -219,9 +252,19 @@ Qmx_CorrManagedImplicitRelationship* Qmx_CorrDataMgr::CreateImplicitRelationship
     return rel;
 }
 
-void Qmx_CorrDataMgr::Commit() {}
+void Qmx_CorrDataMgr::Commit() {
+    if (!m_modified || m_readOnly || !m_archive) return;
+    m_archive->Commit(GetNameRepo(), GetItemDataMgr(), GetRelDataMgr(), m_itemRelOverflow.get(),
+                      m_relItemOverflow.get(), m_top, this);
+    m_modified = false;
+}
 
-void Qmx_CorrDataMgr::FlushAll() {}
+void Qmx_CorrDataMgr::FlushAll() {
+    if (!m_archive) return;
+    m_top->FlushAll(false);
+    m_itemMgr->FlushAllPools(true);
+    m_expRelMgr->FlushAllPools(true);
+}
 
 bool Qmx_CorrDataMgr::DbgValidateState() const {
     const auto report = [](int line, const char* text) {
