@@ -53,11 +53,17 @@ private:
     // The end of the data, or -1. Cached for a file of our own, whose end only our writes
     // move; a caller's stream may be written behind our back and is asked every time.
     std::int64_t DataEnd() const;
+    // The read position, or -1; cached for a file of our own like the end.
+    std::int64_t Position() const;
 
     std::basic_iostream<char>* m_stream;  // owned when m_owned
     bool m_owned;
     Vesk::StringBase<char> m_errorName;
     mutable std::int64_t m_knownEnd;  // -1: not known; used only when m_owned
+    // The position of a file of our own, -1 when not known. Asking a file for its position
+    // costs a system call, and readers ask before every record: our own reads, writes and
+    // moves keep it instead.
+    mutable std::int64_t m_knownPos;
 };
 
 #endif

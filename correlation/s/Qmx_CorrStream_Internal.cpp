@@ -22,7 +22,8 @@ Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(std::basic_iostream<char>* stre
     : m_stream(stream),
       m_owned(false),
       m_errorName(errorName.empty() ? "unknown" : errorName),
-      m_knownEnd(-1) {
+      m_knownEnd(-1),
+      m_knownPos(-1) {
     if (!m_stream || m_stream->bad()) QMX_CORR_THROW(CannotReadDatabase, "unknown");
 }
 
@@ -31,13 +32,16 @@ Qmx_CorrStream_Internal::Qmx_CorrStream_Internal(const Vesk::StringBase<char>& p
     : m_stream(nullptr),
       m_owned(true),
       m_errorName(errorName.empty() ? path : errorName),
-      m_knownEnd(-1) {
-    auto* file = new std::fstream(path, static_cast<std::ios::openmode>(openMode));
+      m_knownEnd(-1),
+      m_knownPos(-1) {
+    const auto mode = static_cast<std::ios::openmode>(openMode);
+    auto* file = new std::fstream(path, mode);
     if (!file->is_open() || file->fail()) {
         delete file;
         QMX_CORR_THROW(CannotReadDatabase, path.c_str());
     }
     m_stream = file;
+    if (!(mode & (std::ios::ate | std::ios::app))) m_knownPos = 0;
 }
 
 Qmx_CorrStream_Internal::~Qmx_CorrStream_Internal() {
@@ -55,6 +59,7 @@ void Qmx_CorrStream_Internal::ThrowFailedWrite() const {
 }
 
 unsigned int Qmx_CorrStream_Internal::GetPos() const {
+    if (m_owned && m_knownPos >= 0) return static_cast<unsigned int>(m_knownPos);
     std::streamoff pos = m_stream->tellp();
     if (pos < 0) pos = m_stream->tellg();
     m_stream->clear();
@@ -64,6 +69,7 @@ unsigned int Qmx_CorrStream_Internal::GetPos() const {
 bool Qmx_CorrStream_Internal::Reposition(std::streamoff offset, std::ios_base::seekdir from) {
     // A stream open for one direction only cannot move the other side; a position that
     // neither side can take is refused, since reading on from the old one would misread.
+    m_knownPos = -1;
     const std::streampos oldPut = m_stream->tellp();
     const std::streampos oldGet = m_stream->tellg();
     m_stream->clear();
@@ -137,14 +143,27 @@ void Qmx_CorrStream_Internal::WriteUINT32(unsigned int value) {
 void Qmx_CorrStream_Internal::read(char* buffer, unsigned int count) {
     if (count == 0) return;
     m_stream->read(buffer, count);
-    if (static_cast<unsigned int>(m_stream->gcount()) != count) ThrowShortRead();
+    if (static_cast<unsigned int>(m_stream->gcount()) != count) {
+        m_knownPos = -1;
+        ThrowShortRead();
+    }
+    if (m_knownPos >= 0) m_knownPos += count;
 }
 
 void Qmx_CorrStream_Internal::write(const char* buffer, unsigned int count) {
     if (count == 0) return;
-    m_knownEnd = -1;
     m_stream->write(buffer, count);
-    if (!*m_stream) ThrowFailedWrite();
+    if (!*m_stream) {
+        m_knownPos = -1;
+        m_knownEnd = -1;
+        ThrowFailedWrite();
+    }
+    if (m_knownPos >= 0) {
+        m_knownPos += count;
+        if (m_knownEnd >= 0 && m_knownPos > m_knownEnd) m_knownEnd = m_knownPos;
+    } else {
+        m_knownEnd = -1;
+    }
 }
 
 void Qmx_CorrStream_Internal::Flush() {
@@ -153,14 +172,22 @@ void Qmx_CorrStream_Internal::Flush() {
 }
 
 std::int64_t Qmx_CorrStream_Internal::BytesLeft() const {
+    const std::int64_t pos = Position();
+    if (pos < 0) return -1;
+    const std::int64_t end = DataEnd();
+    if (end < 0) return -1;
+    return end < pos ? 0 : end - pos;
+}
+
+std::int64_t Qmx_CorrStream_Internal::Position() const {
+    if (m_owned && m_knownPos >= 0) return m_knownPos;
     const std::streamoff pos = m_stream->tellg();
     if (pos < 0) {
         m_stream->clear();
         return -1;
     }
-    const std::int64_t end = DataEnd();
-    if (end < 0) return -1;
-    return end < pos ? 0 : end - static_cast<std::int64_t>(pos);
+    if (m_owned) m_knownPos = static_cast<std::int64_t>(pos);
+    return static_cast<std::int64_t>(pos);
 }
 
 std::int64_t Qmx_CorrStream_Internal::DataEnd() const {
