@@ -1,79 +1,73 @@
-// A small tour of what the library offers so far: a traced operation, a compressed file
-// written and read back through the portability layer, a database file committed and opened
-// again, and an error as a host receives it.
+// A host program in small: it records that the gates of a synthesised design were derived from
+// the registers of its source, commits the database, opens it again read-only and asks where
+// one gate came from.
+//
+//   corr_example [FILE]      (default: example.cpd, removed again at the end)
 #include <cstdio>
 #include <iostream>
 
-#include "Qmx_CorrDb_Internal.h"
-#include "Qmx_CorrDbg.h"
 #include "Qmx_CorrException.h"
-#include "Qmx_CorrStream.h"
+#include "Qmx_CorrMgr.h"
 #include "Vesk_File.h"
-#include "Vesk_Stream.h"
 
 namespace {
 
-constexpr const char* kSourceFile = "examples/corr_example";
-constexpr const char* kRevision = "1";
-
-int Run(const Vesk::StringBase<char>& path) {
-    Qmx_CorrDbg::s_Tracer->SetTraceLevel("ARCHIVE", 5);
-    QMX_CORR_TRACE("ARCHIVE", 5, "Writing '" << path << "' in the compressed form.");
-
-    Vesk::Stream* out = Vesk::File::open(path, Vesk::File::kWrite | Vesk::File::kCompressed, true);
-    if (!out) QMX_CORR_THROW(CannotWriteDatabase, path.c_str());
-    out->writestring("/rtl/u_core/alu/add_3_reg[12]");
-    out->writeuint32(258);
-    if (!Vesk::File::close(out)) QMX_CORR_THROW(CannotWriteDatabase, path.c_str());
-
-    Vesk::Stream* in = Vesk::File::open(path, Vesk::File::kRead, false);
-    if (!in) QMX_CORR_THROW(CannotReadDatabase, path.c_str());
-    Vesk::StringBase<char> name;
-    in->readstring(name);
-    const unsigned value = in->readuint32();
-    Vesk::File::close(in);
-    std::cout << "read back: " << name << " " << value << " (" << Vesk::File::getsize_noopen(path)
-              << " bytes on disk)\n";
-
-    const Vesk::StringBase<char> dbPath = path + ".cpd";
-    {
-        Qmx_CorrDb_Internal db(dbPath);
-        Qmx_CorrStream* stream = db.OpenStream("lineage", 6);
-        stream->WriteString("/syn/u_core/alu/add_3_reg[12] <- /rtl/u_core/alu/add_3");
-        stream->WriteUINT32(3);
-        db.CloseStream(stream);
-        db.Commit();
+void Build(const Vesk::StringBase<char>& path) {
+    Qmx_CorrMgr mgr(path, "", Qmx_CorrMgr::DB_READ_WRITE, nullptr);
+    Qmx_CorrContainer* rtl = mgr.GetTopContainer()->CreateContainer("rtl");
+    Qmx_CorrContainer* syn = mgr.GetTopContainer()->CreateContainer("syn");
+    Qmx_CorrContainer* alu = rtl->CreateContainer("u_core")->CreateContainer("alu");
+    Qmx_CorrItem* add = alu->CreateItem("add_3");
+    Qmx_CorrItem* carry = alu->CreateItem("carry_in");
+    for (int bit = 0; bit < 4; ++bit) {
+        char name[32];
+        std::snprintf(name, sizeof name, "add_3_reg[%d]", bit);
+        Qmx_CorrItem* gate = syn->CreateItem(name);
+        Qmx_CorrExplicitRelationship* rel = mgr.CreateExplicitRelationship(add, gate);
+        if (bit == 0) rel->AddSrcItem(carry);
+        gate->SetProperty_INT32("bit", bit, nullptr);
     }
-    {
-        Qmx_CorrDb_Internal db(dbPath);
-        Qmx_CorrStream* stream = db.OpenStream("lineage", 1);
-        const Vesk::StringBase<char> text = stream->ReadString();
-        std::cout << "database " << dbPath << " (" << Vesk::File::getsize_noopen(dbPath)
-                  << " bytes) holds: " << text << " (stage " << stream->ReadUINT32() << ")\n";
-        db.CloseStream(stream);
-    }
-    Vesk::File::remove_f(dbPath);
+    // Whatever lies beneath /rtl/ corresponds by name to the same place beneath /syn/,
+    // "_in" names becoming "_out" names.
+    mgr.CreateImplicitRelationship(rtl, syn, true, Qmx_CorrImplicitRelationship::DIR_BOTH, "_in$",
+                                   "_out");
+    add->SetProperty_String("kind", "adder", nullptr);
+    mgr.Commit();
+}
 
-    try {
-        QMX_CORR_THROW(InvalidDatabaseFormat, path.c_str());
-    } catch (const Qmx_CorrException::Base& e) {
-        std::cout << "a host sees: " << e.what();
-        std::cout << "raised in " << e.getComponent() << " " << e.getSourceFile() << "("
-                  << e.getLine() << ")\n";
-    }
-    Qmx_CorrDbg::Println(std::cout, 1, "%s", "dump lines are indented by three spaces a level");
-    return 0;
+void Ask(const Vesk::StringBase<char>& path) {
+    const Qmx_CorrMgr mgr(path, "", Qmx_CorrMgr::DB_READ_ONLY, nullptr);
+    const Qmx_CorrContainer* syn = mgr.GetTopContainer()->GetContainer("syn");
+    const Qmx_CorrItem* gate = syn->GetItem("add_3_reg[0]");
+    std::cout << gate->GetAbsoluteName() << " (bit " << gate->GetProperty_INT32("bit", nullptr)
+              << ") was derived from:\n";
+    for (const Qmx_CorrExplicitRelationship* rel : gate->GetIncomingRelationships())
+        for (const Qmx_CorrItem* source : rel->GetSrcItems()) {
+            std::cout << "  " << source->GetAbsoluteName();
+            if (source->HasProperty("kind"))
+                std::cout << " (" << source->GetProperty_String("kind", nullptr) << ")";
+            std::cout << "\n";
+        }
+    const Qmx_CorrImplicitRelationship* rel =
+        mgr.GetTopContainer()->GetContainer("rtl")->GetOutgoingRelationships().front();
+    std::cout << "implicit: " << rel->GetSrcContainer()->GetAbsoluteName() << " "
+              << Qmx_CorrImplicitRelationship::GetDirectionText(rel->GetDirection()) << " "
+              << rel->GetDstContainer()->GetAbsoluteName() << ", '" << rel->GetSrcExpression()
+              << "' to '" << rel->GetDstFormat() << "'\n";
+    std::cout << "database " << path << ": " << Vesk::File::getsize_noopen(path) << " bytes, "
+              << (mgr.DbgValidateState() ? "valid" : "INVALID") << "\n";
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    std::cout.setf(std::ios::unitbuf);  // keep the order of traces and output
-    const Vesk::StringBase<char> path = argc > 1 ? argv[1] : "example.bin";
+    const Vesk::StringBase<char> path = argc > 1 ? argv[1] : "example.cpd";
     try {
-        const int status = Run(path);
         Vesk::File::remove_f(path);
-        return status;
+        Build(path);
+        Ask(path);
+        Vesk::File::remove_f(path);
+        return 0;
     } catch (const Vesk::Exception& e) {
         std::cerr << "corr_example: " << e.what() << "\n";
         return 1;
