@@ -49,6 +49,11 @@ public:
     // Equal texts; an invalid handle equals only itself.
     virtual bool IsEqual(Qmx_CorrNameHandle a, Qmx_CorrNameHandle b) const = 0;
 
+    // Whether a restored record names a text of the string table. RestoreName checks nothing,
+    // and a record beyond the table reads as the empty text: an object would silently lose
+    // its name. Such a record equals not even the empty name.
+    bool NamesStoredText(Qmx_CorrNameHandle name);
+
 protected:
     Qmx_CorrNameRepository() = default;
     Qmx_CorrNameRepository(const Qmx_CorrNameRepository&) = default;

@@ -537,7 +537,7 @@ private:
         const unsigned int entries = storage.ReadUINT32();
         storage.CheckCount(entries, 8);
         for (unsigned int entry = 0; entry < entries; ++entry) ReadFreePoolEntry(storage);
-        if (storage.BytesLeft() > 0) QMX_CORR_THROW(InvalidDatabaseFormat, DbName().c_str());
+        if (stream->HasMoreBytes()) QMX_CORR_THROW(InvalidDatabaseFormat, DbName().c_str());
     }
 
     void ReadFreePoolEntry(Qmx_CorrStorage& storage) {

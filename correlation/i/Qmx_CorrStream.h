@@ -37,6 +37,11 @@ public:
     // tell before reading them. Readers compare every count read from a stream with it
     // before they reserve memory or loop.
     virtual std::int64_t BytesLeft() const;
+    // Whether bytes follow the read position: a reader that has read its last record asks,
+    // since spare bytes mean a damaged count. A stream that cannot tell its length (a
+    // compressed one) is read to its end, where a damaged frame throws InvalidDatabaseFormat
+    // rather than passing for the end.
+    bool HasMoreBytes();
 
 protected:
     Qmx_CorrStream() = default;

@@ -154,7 +154,9 @@ void Qmx_CorrArchive::ReadInfo() {
     m_storageData.objectDataVersion = storage.ReadUINT32();
     m_topContainerOrdinal = storage.ReadUINT32();
     const unsigned int nextContainerId = storage.ReadUINT32();
-    if (m_topContainerOrdinal == 0 || m_topContainerOrdinal >= containerCount)
+    // Bytes after the last field mean the header was written by something else.
+    if (m_topContainerOrdinal == 0 || m_topContainerOrdinal >= containerCount ||
+        storage.BytesLeft() > 0)
         QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
     PrepareTable(m_storageData.containers, containerCount);
     QMX_CORR_TRACE("ARCHIVE", 10, "Initializing memory for " << containerCount << " containers");
@@ -213,8 +215,16 @@ void Qmx_CorrArchive::RestoreStream(const char* name, const char* trace, Reader 
     Qmx_CorrStreamCloser stream(m_db.get(), m_db->OpenStream(name, kReadMode));
     if (!stream.Get()) return;
     QMX_CORR_TRACE("ARCHIVE", 10, trace << name << " stream.");
-    Qmx_CorrStorage storage(m_db->GetName(), stream.Get(), m_storageData);
-    read(storage);
+    const Vesk::StringBase<char> dbName = m_db->GetName();
+    Qmx_CorrStorage storage(dbName, stream.Get(), m_storageData);
+    try {
+        read(storage);
+    } catch (const Qmx_CorrException::IncorrectPropertyType&) {
+        // A stored property tag that is neither type is damage, not a caller's mistake.
+        QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
+    }
+    // Spare bytes mean a count was damaged and records would silently be missing.
+    if (storage.BytesLeft() > 0) QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
 }
 
 void Qmx_CorrArchive::RestoreContainers() {
@@ -249,6 +259,8 @@ void Qmx_CorrArchive::RestoreTable(std::vector<T*>& table, const char* name,
     } catch (...) {
         QMX_CORR_THROW(CannotReadDatabase, dbName.c_str());
     }
+    // Records beyond the table: the table size or a record was damaged.
+    if (storage.BytesLeft() > 0) QMX_CORR_THROW(CannotReadDatabase, dbName.c_str());
 }
 
 // The restored records must form one tree under the top container, every container listed

@@ -16,9 +16,9 @@
 #include "Qmx_CorrNameRepository.h"
 #include "Qmx_CorrObjectOwner.h"
 #include "Qmx_CorrStorage.h"
-#include "Qmx_CorrStreamCloser.h"
 #include "Qmx_CorrStorageData.h"
 #include "Qmx_CorrStream.h"
+#include "Qmx_CorrStreamCloser.h"
 #include "Vesk_Endian.h"
 #include "Vesk_MsgManData.h"
 
@@ -74,7 +74,6 @@ private:
     bool m_saved;
 };
 
-
 // The first name that occurs twice in `names`, or null.
 const Vesk::StringBase<char>* FindDuplicate(std::vector<Vesk::StringBase<char>>& names) {
     std::sort(names.begin(), names.end());
@@ -99,18 +98,6 @@ template <class T>
 void EraseFirst(std::vector<T*>& list, const T* entry) {
     const auto found = std::find(list.begin(), list.end(), entry);
     if (found != list.end()) list.erase(found);
-}
-
-// For a stream that cannot tell its length (a compressed one): whether a byte follows. Bytes
-// after the last handle mean the count was damaged, and the list would come back short.
-bool HasMoreBytes(Qmx_CorrStream& stream) {
-    char byte;
-    try {
-        stream.read(&byte, 1);
-    } catch (const Qmx_CorrException::InvalidDatabaseFormat&) {
-        return false;
-    }
-    return true;
 }
 
 }  // namespace
@@ -162,6 +149,8 @@ Qmx_CorrManagedContainer::Qmx_CorrManagedContainer(Qmx_CorrStorage& storage,
     if (m_parent == this) QMX_CORR_THROW(InvalidDatabaseFormat, storage.GetName().c_str());
     m_name = owner->GetNameRepo()->RestoreName(storage);
     try {
+        if (!owner->GetNameRepo()->NamesStoredText(m_name))
+            QMX_CORR_THROW(InvalidDatabaseFormat, storage.GetName().c_str());
         m_itemsStreamName = storage.ReadString();
         m_containerId = storage.ReadUINT32();
         ReadRestoredLists(storage);
@@ -616,7 +605,7 @@ void Qmx_CorrManagedContainer::ReadItemsStream(Qmx_CorrStream& stream,
         }
         items.push_back(item);
     }
-    if (left < 0 && HasMoreBytes(stream)) QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
+    if (left < 0 && stream.HasMoreBytes()) QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
     m_items.swap(items);
 }
 

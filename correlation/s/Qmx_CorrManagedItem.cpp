@@ -153,6 +153,8 @@ Qmx_CorrManagedItem::Qmx_CorrManagedItem(Qmx_CorrStorage& storage, Qmx_CorrObjec
     m_name = owner->GetNameRepo()->RestoreName(storage);
     // The name record is this object's only field that its destructor would not free.
     try {
+        if (!owner->GetNameRepo()->NamesStoredText(m_name))
+            QMX_CORR_THROW(InvalidDatabaseFormat, storage.GetName().c_str());
         RestoreList(storage, this, owner, m_incoming, kIncoming);
         RestoreList(storage, this, owner, m_outgoing, kOutgoing);
     } catch (...) {

@@ -245,7 +245,7 @@ void Qmx_CorrNameRepo_Basic::ReadTable(Qmx_CorrStream& stream,
     Table table(1);
     if (left >= 0) table.reserve(std::size_t{count} + 1);
     for (unsigned int i = 0; i < count; ++i) table.push_back(stream.ReadString());
-    if (stream.BytesLeft() > 0 || !CountersAgree(table, firstFreeSlot, freeCount)) {
+    if (stream.HasMoreBytes() || !CountersAgree(table, firstFreeSlot, freeCount)) {
         QMX_CORR_THROW(InvalidDatabaseFormat, dbName.c_str());
     }
     m_table.swap(table);
