@@ -6,7 +6,6 @@
 // DIR (default: the current directory) receives the database, its temporary directories and
 // the copy; MIB (default 256) is the stream data in MiB; ROUNDS (default 3) how often each is
 // measured. Prints medians in MB/s and the ratios to cp, and the peak resident memory.
-#include <sys/resource.h>
 
 #include <algorithm>
 #include <chrono>
@@ -16,29 +15,18 @@
 #include <string>
 #include <vector>
 
+#include "BenchMeasure.h"
 #include "Qmx_CorrDb_Internal.h"
 #include "Qmx_CorrStream.h"
 #include "Vesk_File.h"
 
 namespace {
 
+using bench::Median;
+using bench::Seconds;
+
 constexpr std::size_t kStreamSize = 4 << 20;
 constexpr std::size_t kBlock = 64 << 10;
-
-double Seconds(std::chrono::steady_clock::time_point since) {
-    return std::chrono::duration<double>(std::chrono::steady_clock::now() - since).count();
-}
-
-double Median(std::vector<double> values) {
-    std::sort(values.begin(), values.end());
-    return values[values.size() / 2];
-}
-
-long PeakRssMiB() {
-    struct rusage usage;
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss / 1024;
-}
 
 // Fills the database with `streams` streams of pseudo-random bytes that compress a little,
 // like handles and names do.
@@ -79,7 +67,7 @@ int main(int argc, char** argv) {
         {
             Qmx_CorrDb_Internal db(path, work + "/streams-" + std::to_string(round));
             FillStreams(db, streams);
-            rssAfterFill = std::max(rssAfterFill, PeakRssMiB());
+            rssAfterFill = std::max(rssAfterFill, bench::PeakResidentMiB());
             const auto start = std::chrono::steady_clock::now();
             db.Commit();
             commit.push_back(megabytes / Seconds(start));
@@ -112,6 +100,7 @@ int main(int argc, char** argv) {
                 Median(commit) / Median(copy), Median(commit) / Median(durableCopy));
     std::printf("open (unpack)    %8.0f MB/s   %.2f x cp\n", Median(open),
                 Median(open) / Median(copy));
-    std::printf("peak RSS         %8ld MiB (after filling: %ld MiB)\n", PeakRssMiB(), rssAfterFill);
+    std::printf("peak RSS         %8ld MiB (after filling: %ld MiB)\n", bench::PeakResidentMiB(),
+                rssAfterFill);
     return 0;
 }

@@ -8,39 +8,24 @@
 // ITEMS (default 1000000) items and as many relationships less one; ROUNDS (default 3) fresh
 // databases. Prints the medians of items/s and relationships/s and the resident bytes per
 // item (the largest growth of the resident set over one build, relationships included).
-#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "BenchMeasure.h"
 #include "Qmx_CorrMgr.h"
 
 namespace {
 
+using bench::Median;
+using bench::Seconds;
+
 constexpr unsigned kItemsPerContainer = 1000;
-
-double Seconds(std::chrono::steady_clock::time_point since) {
-    return std::chrono::duration<double>(std::chrono::steady_clock::now() - since).count();
-}
-
-double Median(std::vector<double> values) {
-    std::sort(values.begin(), values.end());
-    return values[values.size() / 2];
-}
-
-long ResidentBytes() {
-    std::ifstream statm("/proc/self/statm");
-    long pages = 0;
-    long resident = 0;
-    statm >> pages >> resident;
-    return resident * sysconf(_SC_PAGESIZE);
-}
 
 struct Round {
     double itemsPerSecond;
@@ -63,7 +48,7 @@ std::vector<std::string> MakeNames(unsigned itemCount) {
 
 Round Build(const std::vector<std::string>& names) {
     const auto itemCount = static_cast<unsigned>(names.size());
-    const long before = ResidentBytes();
+    const long before = bench::ResidentBytes();
     Qmx_CorrMgr mgr("", "", Qmx_CorrMgr::DB_READ_WRITE, nullptr);
     char containerName[32];
 
@@ -93,7 +78,7 @@ Round Build(const std::vector<std::string>& names) {
     }
     const double relSeconds = Seconds(start);
 
-    const long after = ResidentBytes();
+    const long after = bench::ResidentBytes();
     return {itemCount / itemSeconds, relationships / relSeconds,
             static_cast<double>(after - before) / itemCount};
 }

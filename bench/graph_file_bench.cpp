@@ -9,46 +9,24 @@
 // ROUNDS (default 3). Prints the median seconds of each phase, the seconds per million items
 // of commit and reopen, the file size per item, and the resident memory before and after the
 // commit (the commit should need little beyond the graph).
-#include <sys/resource.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
 #include <string>
 #include <vector>
 
+#include "BenchMeasure.h"
 #include "Qmx_CorrMgr.h"
 #include "Vesk_File.h"
 
 namespace {
 
+using bench::Median;
+using bench::Seconds;
+
 constexpr unsigned kItemsPerContainer = 1000;
-
-double Seconds(std::chrono::steady_clock::time_point since) {
-    return std::chrono::duration<double>(std::chrono::steady_clock::now() - since).count();
-}
-
-double Median(std::vector<double> values) {
-    std::sort(values.begin(), values.end());
-    return values[values.size() / 2];
-}
-
-long ResidentMiB() {
-    std::ifstream statm("/proc/self/statm");
-    long pages = 0;
-    long resident = 0;
-    statm >> pages >> resident;
-    return resident * sysconf(_SC_PAGESIZE) / (1024 * 1024);
-}
-
-long PeakResidentMiB() {
-    struct rusage usage;
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss / 1024;
-}
 
 struct Round {
     double build, commit, close, reopen, read;
@@ -93,11 +71,11 @@ Round RunRound(const std::string& path, unsigned itemCount) {
     auto start = std::chrono::steady_clock::now();
     BuildGraph(*mgr, itemCount);
     round.build = Seconds(start);
-    round.beforeCommitMiB = ResidentMiB();
+    round.beforeCommitMiB = bench::ResidentBytes() / (1024 * 1024);
     start = std::chrono::steady_clock::now();
     mgr->Commit();
     round.commit = Seconds(start);
-    round.peakMiB = PeakResidentMiB();
+    round.peakMiB = bench::PeakResidentMiB();
     start = std::chrono::steady_clock::now();
     delete mgr;
     round.close = Seconds(start);
