@@ -37,6 +37,7 @@
 #include <memory>
 #include <set>
 #include <stdexcept>
+#include <string>
 #include <type_traits>
 #include <typeinfo>
 #include <unordered_set>
@@ -51,6 +52,7 @@
 #include "Qmx_CorrStorageData.h"
 #include "Qmx_CorrStream.h"
 #include "Qmx_CorrStreamCloser.h"
+#include "Qmx_CorrStream_Buffer.h"
 #include "Qmx_ObjectPoolT.h"
 
 class Qmx_CorrObjectOwner;
@@ -448,7 +450,6 @@ private:
         unsigned int baseHandle;  // handle of slot 0
     };
 
-
     static unsigned int BaseHandle(unsigned int index) { return (index + 1) * kPoolSize; }
 
     Vesk::StringBase<char> DbName() const { return m_db->GetName(); }
@@ -600,16 +601,20 @@ private:
         m_pools.assign(poolCount, nullptr);
     }
 
+    // The record is read from the file in one piece and parsed in memory.
     void RestorePool(PoolT& pool, unsigned int index) {
         Qmx_CorrStream* stream = m_storage->GetStream();
         const std::uint64_t start = UsedSize(index);
         stream->SeekPos(static_cast<unsigned int>(start));
         m_storage->CheckCount(1, m_poolRecordSize);
-        pool.Restore(*m_storage, m_owner, m_recordSize);
+        std::string bytes(m_poolRecordSize, '\0');
+        stream->read(&bytes[0], m_poolRecordSize);
+        Qmx_CorrStream_Buffer buffer(DbName());
+        buffer.Assign(std::move(bytes));
+        Qmx_CorrStorage storage(m_storage->GetName(), &buffer, m_storage->GetData());
+        pool.Restore(storage, m_owner, m_recordSize);
         // Each record must take exactly its size, or the slots after it are misread.
-        if (stream->GetPos() != start + m_poolRecordSize) {
-            QMX_CORR_THROW(InvalidDatabaseFormat, DbName().c_str());
-        }
+        if (buffer.BytesLeft() != 0) QMX_CORR_THROW(InvalidDatabaseFormat, DbName().c_str());
     }
 
     // Writes pool `index` to its place; false when it is not in memory or the manager is
@@ -620,9 +625,15 @@ private:
                        "Pool " << m_name << ": Flushing pool " << index << " to disk.");
         const unsigned int start = static_cast<unsigned int>(UsedSize(index));
         PadStreamTo(start);
+        // Built in memory and written in one piece.
+        Qmx_CorrStream_Buffer buffer(DbName());
+        buffer.Reserve(m_poolRecordSize);
+        Qmx_CorrStorage storage(m_storage->GetName(), &buffer, m_storage->GetData());
+        m_pools[index]->Archive(storage, m_recordSize, m_zeros.data());
         Qmx_CorrStream* stream = m_storage->GetStream();
         stream->SeekPos(start);
-        m_pools[index]->Archive(*m_storage, m_recordSize, m_zeros.data());
+        stream->write(buffer.GetBytes().data(),
+                      static_cast<unsigned int>(buffer.GetBytes().size()));
         if (m_streamEnd < start + m_poolRecordSize) m_streamEnd = start + m_poolRecordSize;
         return true;
     }
