@@ -70,6 +70,9 @@ public:
     void DiscardName(Qmx_CorrNameHandle name) override;
     bool IsLess(Qmx_CorrNameHandle a, Qmx_CorrNameHandle b) const override;
     bool IsEqual(Qmx_CorrNameHandle a, Qmx_CorrNameHandle b) const override;
+    // Without copying the text: whether the record is one of this repository's and its
+    // index lies within the string table.
+    bool NamesStoredText(Qmx_CorrNameHandle name) override;
 
     // The process-wide repository, made on first use and destroyed when the library is
     // unloaded. Every database that uses it writes its names into it, and each restore

@@ -51,8 +51,9 @@ public:
 
     // Whether a restored record names a text of the string table. RestoreName checks nothing,
     // and a record beyond the table reads as the empty text: an object would silently lose
-    // its name. Such a record equals not even the empty name.
-    bool NamesStoredText(Qmx_CorrNameHandle name);
+    // its name. Such a record equals not even the empty name. Asked for every object
+    // restored, so a repository that can tell directly overrides it.
+    virtual bool NamesStoredText(Qmx_CorrNameHandle name);
 
 protected:
     Qmx_CorrNameRepository() = default;

@@ -22,12 +22,13 @@ public:
     virtual void SeekPos(unsigned int pos) = 0;
     virtual Vesk::StringBase<char> ReadString() = 0;
     virtual void WriteString(const Vesk::StringBase<char>& text) = 0;
-    virtual bool ReadBool() = 0;
-    virtual void WriteBool(bool value) = 0;
-    virtual unsigned char ReadUINT8() = 0;
-    virtual void WriteUINT8(unsigned char value) = 0;
-    virtual unsigned int ReadUINT32() = 0;
-    virtual void WriteUINT32(unsigned int value) = 0;
+    // By default through read and write in the encodings above.
+    virtual bool ReadBool();
+    virtual void WriteBool(bool value);
+    virtual unsigned char ReadUINT8();
+    virtual void WriteUINT8(unsigned char value);
+    virtual unsigned int ReadUINT32();
+    virtual void WriteUINT32(unsigned int value);
     // Exactly `count` raw bytes.
     virtual void read(char* buffer, unsigned int count) = 0;
     virtual void write(const char* buffer, unsigned int count) = 0;

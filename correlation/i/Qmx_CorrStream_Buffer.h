@@ -23,12 +23,6 @@ public:
     void SeekPos(unsigned int pos) override;
     Vesk::StringBase<char> ReadString() override;
     void WriteString(const Vesk::StringBase<char>& text) override;
-    bool ReadBool() override { return ReadUINT8() != 0; }
-    void WriteBool(bool value) override { WriteUINT8(value ? 1 : 0); }
-    unsigned char ReadUINT8() override;
-    void WriteUINT8(unsigned char value) override;
-    unsigned int ReadUINT32() override;
-    void WriteUINT32(unsigned int value) override;
     void read(char* buffer, unsigned int count) override;
     // Overwrites from the position on, growing the bytes where it passes their end.
     void write(const char* buffer, unsigned int count) override;

@@ -26,8 +26,6 @@ public:
     void SeekPos(unsigned int pos) override;
     Vesk::StringBase<char> ReadString() override;
     void WriteString(const Vesk::StringBase<char>& text) override;
-    bool ReadBool() override;
-    void WriteBool(bool value) override;
     unsigned char ReadUINT8() override;
     void WriteUINT8(unsigned char value) override;
     unsigned int ReadUINT32() override;

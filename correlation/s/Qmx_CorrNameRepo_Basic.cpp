@@ -159,6 +159,10 @@ bool Qmx_CorrNameRepo_Basic::IsLess(Qmx_CorrNameHandle a, Qmx_CorrNameHandle b) 
     return m_table[left->GetIndex()].Compare(m_table[right->GetIndex()]) < 0;
 }
 
+bool Qmx_CorrNameRepo_Basic::NamesStoredText(Qmx_CorrNameHandle name) {
+    return GetValidRecord(name) != nullptr;
+}
+
 bool Qmx_CorrNameRepo_Basic::IsEqual(Qmx_CorrNameHandle a, Qmx_CorrNameHandle b) const {
     if (a.GetRecord() == b.GetRecord()) return true;
     const Qmx_CorrName_Basic* left = GetValidRecord(a);

@@ -4,7 +4,6 @@
 #include <utility>
 
 #include "Qmx_CorrException.h"
-#include "Vesk_Endian.h"
 
 namespace {
 const char* const kSourceFile = "s/Qmx_CorrStream_Buffer";
@@ -37,29 +36,6 @@ void Qmx_CorrStream_Buffer::WriteString(const Vesk::StringBase<char>& text) {
     if (text.size() > 0xFFFFFFFFu) QMX_CORR_THROW(CannotWriteDatabase, m_errorName.c_str());
     WriteUINT32(static_cast<unsigned int>(text.size()));
     write(text.data(), static_cast<unsigned int>(text.size()));
-}
-
-unsigned char Qmx_CorrStream_Buffer::ReadUINT8() {
-    char byte;
-    read(&byte, 1);
-    return static_cast<unsigned char>(byte);
-}
-
-void Qmx_CorrStream_Buffer::WriteUINT8(unsigned char value) {
-    const char byte = static_cast<char>(value);
-    write(&byte, 1);
-}
-
-unsigned int Qmx_CorrStream_Buffer::ReadUINT32() {
-    char bytes[4];
-    read(bytes, 4);
-    return Vesk_Endian::DecodeUINT32LE(bytes);
-}
-
-void Qmx_CorrStream_Buffer::WriteUINT32(unsigned int value) {
-    char bytes[4];
-    Vesk_Endian::EncodeUINT32LE(value, bytes);
-    write(bytes, 4);
 }
 
 void Qmx_CorrStream_Buffer::read(char* buffer, unsigned int count) {

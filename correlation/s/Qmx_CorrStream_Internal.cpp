@@ -5,7 +5,6 @@
 #include <iostream>
 
 #include "Qmx_CorrException.h"
-#include "Vesk_Endian.h"
 
 namespace {
 
@@ -111,33 +110,6 @@ void Qmx_CorrStream_Internal::WriteString(const Vesk::StringBase<char>& text) {
     if (text.size() > 0xFFFFFFFFu) ThrowFailedWrite();
     WriteUINT32(static_cast<unsigned int>(text.size()));
     write(text.data(), static_cast<unsigned int>(text.size()));
-}
-
-bool Qmx_CorrStream_Internal::ReadBool() { return ReadUINT8() != 0; }
-
-void Qmx_CorrStream_Internal::WriteBool(bool value) { WriteUINT8(value ? 1 : 0); }
-
-unsigned char Qmx_CorrStream_Internal::ReadUINT8() {
-    char byte;
-    read(&byte, 1);
-    return static_cast<unsigned char>(byte);
-}
-
-void Qmx_CorrStream_Internal::WriteUINT8(unsigned char value) {
-    const char byte = static_cast<char>(value);
-    write(&byte, 1);
-}
-
-unsigned int Qmx_CorrStream_Internal::ReadUINT32() {
-    char bytes[4];
-    read(bytes, 4);
-    return Vesk_Endian::DecodeUINT32LE(bytes);
-}
-
-void Qmx_CorrStream_Internal::WriteUINT32(unsigned int value) {
-    char bytes[4];
-    Vesk_Endian::EncodeUINT32LE(value, bytes);
-    write(bytes, 4);
 }
 
 void Qmx_CorrStream_Internal::read(char* buffer, unsigned int count) {

@@ -57,10 +57,6 @@ void Qmx_CorrStream_UTStr::WriteString(const Vesk::StringBase<char>& text) {
     QMX_UTSTR_CALL(false, m_stream->writestring(text));
 }
 
-bool Qmx_CorrStream_UTStr::ReadBool() { return ReadUINT8() != 0; }
-
-void Qmx_CorrStream_UTStr::WriteBool(bool value) { WriteUINT8(value ? 1 : 0); }
-
 unsigned char Qmx_CorrStream_UTStr::ReadUINT8() {
     unsigned char byte = 0;
     QMX_UTSTR_CALL(true, m_stream->read(byte));
