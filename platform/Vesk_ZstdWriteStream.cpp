@@ -13,8 +13,9 @@ namespace Vesk {
 
 namespace {
 
-// Fast enough to keep up with the disk; the data is mostly names and handles.
-constexpr int kCompressionLevel = 3;
+// The fastest level: the data is mostly names and handles, which compress well even so, and a
+// commit must not wait for the compressor.
+constexpr int kCompressionLevel = 1;
 
 }  // namespace
 
@@ -27,6 +28,7 @@ ZstdWriteStream::ZstdWriteStream(std::FILE* file, const StringBase<char>& path)
       m_finished(false) {
     ZSTD_CCtx_setParameter(m_context, ZSTD_c_compressionLevel, kCompressionLevel);
     ZSTD_CCtx_setParameter(m_context, ZSTD_c_checksumFlag, 1);
+    m_in.reserve(ZSTD_CStreamInSize());
 }
 
 ZstdWriteStream::~ZstdWriteStream() {
@@ -65,6 +67,12 @@ void ZstdWriteStream::Drive(const char* buffer, std::size_t count, ZSTD_EndDirec
     }
 }
 
+void ZstdWriteStream::DrainInput() {
+    if (m_in.empty()) return;
+    Drive(m_in.data(), m_in.size(), ZSTD_e_continue);
+    m_in.clear();
+}
+
 std::size_t ZstdWriteStream::doRead(char*, std::size_t) { return 0; }
 
 void ZstdWriteStream::doWrite(const char* buffer, std::size_t count) {
@@ -73,7 +81,12 @@ void ZstdWriteStream::doWrite(const char* buffer, std::size_t count) {
         throw IOException(IOException::kUnsupported, "platform/Vesk_ZstdWriteStream", __LINE__,
                           "Write after the end of a compressed stream.");
     }
-    Drive(buffer, count, ZSTD_e_continue);
+    if (m_in.size() + count > m_in.capacity()) DrainInput();
+    if (count >= m_in.capacity()) {
+        Drive(buffer, count, ZSTD_e_continue);
+    } else {
+        m_in.insert(m_in.end(), buffer, buffer + count);
+    }
     m_pos += static_cast<std::int64_t>(count);
 }
 
@@ -86,7 +99,10 @@ void ZstdWriteStream::setfoffset(std::int64_t offset) {
 
 void ZstdWriteStream::flush() {
     if (!m_file) return;
-    if (!m_finished) Drive(nullptr, 0, ZSTD_e_flush);
+    if (!m_finished) {
+        DrainInput();
+        Drive(nullptr, 0, ZSTD_e_flush);
+    }
     if (FaultInjector::ShouldFail(FaultInjector::kFlush)) {
         errno = EIO;
         Fail(__LINE__, "Cannot flush");
@@ -97,6 +113,7 @@ void ZstdWriteStream::flush() {
 void ZstdWriteStream::finish() {
     if (!m_file) return;
     if (!m_finished) {
+        DrainInput();
         Drive(nullptr, 0, ZSTD_e_end);
         m_finished = true;
     }

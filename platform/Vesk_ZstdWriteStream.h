@@ -37,6 +37,8 @@ protected:
 private:
     // Runs the compressor with `mode` until it has nothing more to give.
     void Drive(const char* buffer, std::size_t count, ZSTD_EndDirective mode);
+    // Hands the gathered input to the compressor.
+    void DrainInput();
     void WriteOut(std::size_t count);
     [[noreturn]] void Fail(int line, const char* what) const;
 
@@ -44,6 +46,8 @@ private:
     StringBase<char> m_path;
     ZSTD_CCtx* m_context;  // owned
     std::vector<char> m_out;
+    // Callers write a few bytes at a time; the compressor is driven once per block.
+    std::vector<char> m_in;
     std::int64_t m_pos;
     bool m_finished;
 };

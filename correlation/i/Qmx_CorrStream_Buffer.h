@@ -23,6 +23,9 @@ public:
     void SeekPos(unsigned int pos) override;
     Vesk::StringBase<char> ReadString() override;
     void WriteString(const Vesk::StringBase<char>& text) override;
+    // Records are mostly 32-bit values: these two skip the general read and write.
+    unsigned int ReadUINT32() override;
+    void WriteUINT32(unsigned int value) override;
     void read(char* buffer, unsigned int count) override;
     // Overwrites from the position on, growing the bytes where it passes their end.
     void write(const char* buffer, unsigned int count) override;

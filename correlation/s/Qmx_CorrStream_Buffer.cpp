@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "Qmx_CorrException.h"
+#include "Vesk_Endian.h"
 
 namespace {
 const char* const kSourceFile = "s/Qmx_CorrStream_Buffer";
@@ -36,6 +37,24 @@ void Qmx_CorrStream_Buffer::WriteString(const Vesk::StringBase<char>& text) {
     if (text.size() > 0xFFFFFFFFu) QMX_CORR_THROW(CannotWriteDatabase, m_errorName.c_str());
     WriteUINT32(static_cast<unsigned int>(text.size()));
     write(text.data(), static_cast<unsigned int>(text.size()));
+}
+
+unsigned int Qmx_CorrStream_Buffer::ReadUINT32() {
+    if (m_bytes.size() - m_pos < 4) ThrowShortRead();
+    const unsigned int value = Vesk_Endian::DecodeUINT32LE(m_bytes.data() + m_pos);
+    m_pos += 4;
+    return value;
+}
+
+void Qmx_CorrStream_Buffer::WriteUINT32(unsigned int value) {
+    if (m_pos != m_bytes.size()) {
+        Qmx_CorrStream::WriteUINT32(value);
+        return;
+    }
+    for (int shift = 0; shift < 32; shift += 8) {
+        m_bytes.push_back(static_cast<char>((value >> shift) & 0xFFu));
+    }
+    m_pos += 4;
 }
 
 void Qmx_CorrStream_Buffer::read(char* buffer, unsigned int count) {

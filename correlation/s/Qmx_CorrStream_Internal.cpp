@@ -66,6 +66,16 @@ unsigned int Qmx_CorrStream_Internal::GetPos() const {
 }
 
 bool Qmx_CorrStream_Internal::Reposition(std::streamoff offset, std::ios_base::seekdir from) {
+    if (m_owned) {
+        // A file has one position for both sides, so one move does; and pools are mostly
+        // written and read in order, where the file is already at the place asked for.
+        if (from == std::ios::beg && offset == m_knownPos) return true;
+        m_stream->clear();
+        const std::streamoff moved = m_stream->rdbuf()->pubseekoff(offset, from);
+        m_knownPos = moved;
+        if (moved >= 0) return true;
+        m_knownPos = -1;
+    }
     // A stream open for one direction only cannot move the other side; a position that
     // neither side can take is refused, since reading on from the old one would misread.
     m_knownPos = -1;
